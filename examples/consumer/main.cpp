@@ -1,0 +1,16 @@
+// A program outside the library's tree, linked against an installed copy through find_package.
+#include "RKMMathBox.h"
+#include "RKMMathPoint.h"
+#include "RKMPolyBoxf.h"
+
+#include <cstdio>
+#include <cstdlib>
+
+int main()
+{
+  RKMPolyBoxf box(RKMMathBox(RKMMathPoint(0.1, 0.2, 0.3), RKMMathPoint(1.1, 1.2, 1.3)));
+  RKMPolyBoxf probe(1.0, 2.0, 1.0, 2.0, 1.0, 2.0);
+  const bool ok = box.IsContaining(RKMMathPoint(0.1, 0.2, 0.3)) && box.IsIntersecting(probe, 0.0f);
+  std::printf("installed library linked: %s\n", ok ? "ok" : "wrong answer");
+  return ok ? EXIT_SUCCESS : EXIT_FAILURE;
+}
