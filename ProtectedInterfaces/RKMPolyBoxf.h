@@ -34,7 +34,8 @@ public:
   /// Stores the float bounds as given (order xmin, xmax, ymin, ymax, zmin, zmax), without rounding.
   RKMPolyBoxf(float xmin, float xmax, float ymin, float ymax, float zmin, float zmax);
   /// Rounds each double bound to float and steps it outward (order xmin, xmax, ymin, ymax, zmin, zmax).
-  /// Inverted bounds give an empty box, stepped all the same.
+  /// Inverted bounds are stepped all the same, so they give an empty box unless the inversion is
+  /// within the steps.
   RKMPolyBoxf(double xmin, double xmax, double ymin, double ymax, double zmin, double zmax);
   /// The box enclosing a math box, bounds stepped outward; empty for an empty math box.
   explicit RKMPolyBoxf(const RKMMathBox &box);
@@ -56,8 +57,8 @@ public:
   void AddInside(const RKMMathPointf &p);
   /// The union of a and b; on equal bounds those of a are kept.
   void SetToUnion(const RKMPolyBoxf &a, const RKMPolyBoxf &b);
-  /// Moves every bound outward by d, in float, then one step further. A negative d shrinks the box and
-  /// may empty it. Nothing when empty.
+  /// Moves every bound outward by d (computed in double), then rounds and steps it outward like any
+  /// double bound. A negative d shrinks the box and may empty it. Nothing when empty.
   void Inflate(double d);
 
   unsigned char IsEmpty() const { return m_min[0] > m_max[0]; }

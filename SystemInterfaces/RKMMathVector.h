@@ -3,6 +3,7 @@
 #include "RKMSysTypes.h"
 
 #include <cmath>
+#include <limits>
 
 /// Vector of three doubles.
 class RKMMathVector
@@ -37,28 +38,38 @@ public:
   constexpr double Dot(const RKMMathVector &v) const { return *this * v; }
   constexpr RKMMathVector Cross(const RKMMathVector &v) const { return *this ^ v; }
   constexpr double SquareNorm() const { return x * x + y * y + z * z; }
-  /// Euclidean norm, computed scaled so that it neither overflows nor underflows.
+  /// Euclidean norm, computed scaled so that it neither overflows nor underflows; NaN when a
+  /// component is NaN.
   double Norm() const
   {
-    double m = std::fmax(std::fabs(x), std::fmax(std::fabs(y), std::fabs(z)));
-    if (!(m > 0.0) || !std::isfinite(m))
-      return (m == 0.0) ? 0.0 : (std::isnan(m) ? m : HUGE_VAL);
-    double a = x / m, b = y / m, c = z / m;
+    if (std::isnan(x) || std::isnan(y) || std::isnan(z))
+      return std::numeric_limits<double>::quiet_NaN();
+    const double m = LargestMagnitude();
+    if (m == 0.0 || std::isinf(m))
+      return m;
+    const double a = x / m, b = y / m, c = z / m;
     return m * std::sqrt(a * a + b * b + c * c);
   }
   /// Scales to unit length in place. A zero or non-finite vector is left unchanged and gives E_FAIL.
   HRESULT Normalize()
   {
-    double m = std::fmax(std::fabs(x), std::fmax(std::fabs(y), std::fabs(z)));
-    if (!(m > 0.0) || !std::isfinite(m))
+    if (!std::isfinite(x) || !std::isfinite(y) || !std::isfinite(z))
       return E_FAIL;
-    double a = x / m, b = y / m, c = z / m;
-    double n = std::sqrt(a * a + b * b + c * c);
-    x = a / n; y = b / n; z = c / n;
+    const double m = LargestMagnitude();
+    if (m == 0.0)
+      return E_FAIL;
+    const double a = x / m, b = y / m, c = z / m;
+    const double n = std::sqrt(a * a + b * b + c * c);
+    x = a / n;
+    y = b / n;
+    z = c / n;
     return S_OK;
   }
   /// Angle to v in radians, in [0, pi]; 0 when either vector is zero.
   double GetAngleTo(const RKMMathVector &v) const { return std::atan2((*this ^ v).Norm(), *this * v); }
+
+private:
+  double LargestMagnitude() const { return std::fmax(std::fabs(x), std::fmax(std::fabs(y), std::fabs(z))); }
 };
 
 inline constexpr RKMMathVector operator*(double s, const RKMMathVector &v) { return v * s; }

@@ -1,6 +1,7 @@
 #include "RKMPolyBoxf.h"
 
 #include "RKMMathBox.h"
+#include "RKMMathFloat.h"
 #include "RKMMathPoint.h"
 #include "RKMMathPointf.h"
 
@@ -25,19 +26,6 @@ inline float FromBits(std::uint32_t i)
   float f;
   std::memcpy(&f, &i, sizeof f);
   return f;
-}
-
-// Round to nearest, as the hardware conversion does, but spelled out beyond the float range where
-// the language leaves the conversion undefined: FLT_MAX + half an ulp (2^103) is where rounding
-// reaches infinity. NaN passes through.
-inline float ToFloatNearest(double d)
-{
-  constexpr double kOverflow = 0x1.ffffffp+127;
-  if (d > FLT_MAX)
-    return d < kOverflow ? FLT_MAX : kInf;
-  if (d < -FLT_MAX)
-    return d > -kOverflow ? -FLT_MAX : -kInf;
-  return static_cast<float>(d);
 }
 
 // The next float toward −∞, by one step of the bit pattern read as a signed integer. An infinite
@@ -68,8 +56,8 @@ inline float StepUp(float f)
 
 // A double entering as a lower or upper bound: rounded, then stepped outward, so the float bound lies
 // on the safe side of the double. A NaN gives an unbounded side.
-inline float LowerBound(double d) { return std::isnan(d) ? -kInf : StepDown(ToFloatNearest(d)); }
-inline float UpperBound(double d) { return std::isnan(d) ? kInf : StepUp(ToFloatNearest(d)); }
+inline float LowerBound(double d) { return std::isnan(d) ? -kInf : StepDown(RKMRoundToFloat(d)); }
+inline float UpperBound(double d) { return std::isnan(d) ? kInf : StepUp(RKMRoundToFloat(d)); }
 
 inline float LowerFloat(float f) { return std::isnan(f) ? -kInf : f; }
 inline float UpperFloat(float f) { return std::isnan(f) ? kInf : f; }
@@ -227,14 +215,13 @@ void RKMPolyBoxf::Inflate(double d)
 {
   if (IsEmpty())
     return;
-  const float f = ToFloatNearest(d);
+  // The moved bounds are formed in double and then rounded and stepped like any double entering the
+  // box. Rounding d to float first would lose up to half an ulp of d, which one step of a small result
+  // does not cover when a bound and d nearly cancel. inf − inf gives a NaN: an unbounded side.
   for (int i = 0; i < 3; ++i)
   {
-    // inf − inf gives a NaN, read as an unbounded side like any other.
-    const float lo = m_min[i] - f;
-    const float hi = m_max[i] + f;
-    m_min[i] = std::isnan(lo) ? -kInf : StepDown(lo);
-    m_max[i] = std::isnan(hi) ? kInf : StepUp(hi);
+    m_min[i] = LowerBound(static_cast<double>(m_min[i]) - d);
+    m_max[i] = UpperBound(static_cast<double>(m_max[i]) + d);
   }
 }
 
@@ -252,12 +239,15 @@ HRESULT RKMPolyBoxf::GetLimits(float &xmin, float &xmax, float &ymin, float &yma
 HRESULT RKMPolyBoxf::GetLimits(double &xmin, double &xmax, double &ymin, double &ymax, double &zmin,
                                double &zmax) const
 {
-  if (IsEmpty())
-    return E_FAIL;
-  xmin = m_min[0]; xmax = m_max[0];
-  ymin = m_min[1]; ymax = m_max[1];
-  zmin = m_min[2]; zmax = m_max[2];
-  return S_OK;
+  float f[6];
+  const HRESULT hr = GetLimits(f[0], f[1], f[2], f[3], f[4], f[5]);
+  if (SUCCEEDED(hr))
+  {
+    xmin = f[0]; xmax = f[1];
+    ymin = f[2]; ymax = f[3];
+    zmin = f[4]; zmax = f[5];
+  }
+  return hr;
 }
 
 HRESULT RKMPolyBoxf::GetLowLimit(RKMMathPoint &p) const
@@ -320,7 +310,7 @@ unsigned char RKMPolyBoxf::IsIntersecting(const RKMMathBox &box, double toleranc
   // Rounding to nearest is monotone, so the rounded limits are never on the wrong side of a float
   // bound that the double limits reach: no overlap is lost by not stepping here.
   for (int i = 0; i < 3; ++i)
-    if (ToFloatNearest(l[2 * i + 1] + tolerance) < m_min[i] || m_max[i] < ToFloatNearest(l[2 * i] - tolerance))
+    if (RKMRoundToFloat(l[2 * i + 1] + tolerance) < m_min[i] || m_max[i] < RKMRoundToFloat(l[2 * i] - tolerance))
       return 0;
   return 1;
 }

@@ -65,6 +65,9 @@ void RKMMathBox::SetExtremities(double xmin, double xmax, double ymin, double ym
 
 void RKMMathBox::AddInside(const RKMMathPoint &p)
 {
+  // A box emptied by inverted limits keeps them; growing starts again from nothing.
+  if (IsEmpty())
+    SetToEmpty();
   for (int i = 0; i < 3; ++i)
   {
     double v = p[i];
@@ -83,6 +86,8 @@ void RKMMathBox::AddInside(const RKMMathBox &b)
 {
   if (b.IsEmpty())
     return;
+  if (IsEmpty())
+    SetToEmpty();
   for (int i = 0; i < 3; ++i)
   {
     if (b.m_min[i] < m_min[i]) m_min[i] = b.m_min[i];
@@ -163,7 +168,11 @@ double RKMMathBox::Volume() const
 {
   if (IsEmpty())
     return 0.0;
-  return (m_max[0] - m_min[0]) * (m_max[1] - m_min[1]) * (m_max[2] - m_min[2]);
+  const double ex = m_max[0] - m_min[0], ey = m_max[1] - m_min[1], ez = m_max[2] - m_min[2];
+  // A flat box has no volume, even when another extent is infinite (inf · 0 would give NaN).
+  if (ex == 0.0 || ey == 0.0 || ez == 0.0)
+    return 0.0;
+  return ex * ey * ez;
 }
 
 bool RKMMathBox::operator==(const RKMMathBox &b) const

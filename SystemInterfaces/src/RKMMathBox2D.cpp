@@ -21,6 +21,8 @@ void RKMMathBox2D::SetToEmpty()
 
 void RKMMathBox2D::AddInside(const RKMMathPoint2D &p)
 {
+  if (IsEmpty())
+    SetToEmpty();
   const double v[2] = {p.x, p.y};
   for (int i = 0; i < 2; ++i)
   {
@@ -39,6 +41,8 @@ void RKMMathBox2D::AddInside(const RKMMathBox2D &b)
 {
   if (b.IsEmpty())
     return;
+  if (IsEmpty())
+    SetToEmpty();
   for (int i = 0; i < 2; ++i)
   {
     if (b.m_min[i] < m_min[i]) m_min[i] = b.m_min[i];

@@ -104,6 +104,9 @@ void *RKMSpecializedNew(size_t size, RKMSysPool *pool, const void *, int, unsign
     size = pool->blockSize;
   if (size == 0)
     size = 1;
+  // Beyond this the header and the rounding to a size class would wrap around.
+  if (size > SIZE_MAX - kHeader - kGranule)
+    return nullptr;
   const size_t index = (size + kGranule - 1) / kGranule;
   char *raw;
   if (kPooling && index <= kClasses)
@@ -111,11 +114,7 @@ void *RKMSpecializedNew(size_t size, RKMSysPool *pool, const void *, int, unsign
     raw = static_cast<char *>(TakeFromClass(index));
   }
   else
-  {
-    if (size > SIZE_MAX - kHeader)
-      return nullptr;
     raw = static_cast<char *>(std::malloc(kHeader + size));
-  }
   if (!raw)
     return nullptr;
   const size_t tag = (kPooling && index <= kClasses) ? index : 0;
