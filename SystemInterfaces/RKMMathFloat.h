@@ -19,11 +19,14 @@ inline float RKMRoundToFloat(double d)
 #include <cstdint>
 #include <cstring>
 
-/// The bit pattern of a float with −0 folded to +0, for hashes that must agree with == on zeros.
+/// The bit pattern of a float with −0 folded to +0 and every NaN to one quiet NaN, for hashes that
+/// must agree with comparisons that find the two zeros equal, and all NaNs equal.
 inline std::uint32_t RKMFoldedFloatBits(float f)
 {
   if (f == 0.0f)
     f = 0.0f;
+  if (f != f)
+    return 0x7FC00000u;
   std::uint32_t i;
   std::memcpy(&i, &f, sizeof i);
   return i;

@@ -1,0 +1,10 @@
+#pragma once
+
+#include "RKMHTableTyped.h"
+
+/// Map of pointer keys to int values, hashed by the address shifted right by 2; no allocation up to 31 entries.
+class RKMMapOfPtrToInt : public RKMTypedMap<void *, int, RKMHTableDetail::FixedK<&RKMDefaultWordHash>>
+{
+public:
+  using RKMTypedMap<void *, int, RKMHTableDetail::FixedK<&RKMDefaultWordHash>>::RKMTypedMap;
+};
