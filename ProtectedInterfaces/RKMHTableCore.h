@@ -121,7 +121,7 @@ public:
   {
     if (!m_capacity)
       return nullptr;
-    for (Entry *e = m_buckets[m_traits.Hash(k) % m_capacity]; e; e = e->next)
+    for (Entry *e = m_buckets[Bucket(m_traits.Hash(k))]; e; e = e->next)
       if (m_traits.Equal(*e, k))
         return e;
     return nullptr;
@@ -135,7 +135,7 @@ public:
     if (!m_capacity)
       return E_OUTOFMEMORY;
     const unsigned h = m_traits.Hash(k);
-    Entry **link = &m_buckets[h % m_capacity];
+    Entry **link = &m_buckets[Bucket(h)];
     for (; *link; link = &(*link)->next)
       if (m_traits.Equal(**link, k))
       {
@@ -146,7 +146,7 @@ public:
     {
       if (!Grow())
         return E_OUTOFMEMORY;
-      for (link = &m_buckets[h % m_capacity]; *link; link = &(*link)->next)
+      for (link = &m_buckets[Bucket(h)]; *link; link = &(*link)->next)
       {
       }
     }
@@ -165,7 +165,7 @@ public:
   {
     if (!m_capacity || !m_size)
       return S_FALSE;
-    Entry **link = &m_buckets[m_traits.Hash(k) % m_capacity];
+    Entry **link = &m_buckets[Bucket(m_traits.Hash(k))];
     while (*link && !m_traits.Equal(**link, k))
       link = &(*link)->next;
     Entry *hole = *link;
@@ -179,7 +179,7 @@ public:
     Entry *last = --m_nextFree;
     if (m_size == 0 || hole == last)
       return S_OK;
-    Entry **toLast = &m_buckets[m_traits.Hash(Traits::KeyOf(*last)) % m_capacity];
+    Entry **toLast = &m_buckets[Bucket(m_traits.Hash(Traits::KeyOf(*last)))];
     while (*toLast != last)
       toLast = &(*toLast)->next;
     *toLast = hole;
@@ -234,16 +234,31 @@ public:
     m_size = 0;
   }
 
-  Entry *HeadOfBucket(unsigned hash) const { return m_capacity ? m_buckets[hash % m_capacity] : nullptr; }
+  Entry *HeadOfBucket(unsigned hash) const { return m_capacity ? m_buckets[Bucket(hash)] : nullptr; }
   const Traits &GetTraits() const { return m_traits; }
 
 protected:
   Traits m_traits;
 
 private:
+  // hash mod capacity without a division: with M = ⌊(2^64 − 1) / capacity⌋ + 1, the high 64 bits of
+  // (M·hash mod 2^64)·capacity are hash mod capacity, exactly, for every 32-bit hash and capacity.
+  unsigned Bucket(unsigned hash) const
+  {
+    const std::uint64_t low = m_modMultiplier * hash;
+    return static_cast<unsigned>((static_cast<unsigned __int128>(low) * m_capacity) >> 64);
+  }
+
+  void SetCapacity(std::size_t capacity)
+  {
+    m_capacity = static_cast<unsigned>(capacity);
+    m_modMultiplier = UINT64_MAX / capacity + 1;
+  }
+
   void SetFailed()
   {
     m_capacity = 0;
+    m_modMultiplier = 0;
     m_buckets = nullptr;
     m_nextFree = nullptr;
     m_free = 0;
@@ -273,7 +288,7 @@ private:
       entries = reinterpret_cast<Entry *>(buckets + capacity);
     }
     std::memset(static_cast<void *>(buckets), 0, capacity * sizeof(Entry *));
-    m_capacity = static_cast<unsigned>(capacity);
+    SetCapacity(capacity);
     m_buckets = buckets;
     m_nextFree = entries;
     m_free = static_cast<int>(capacity);
@@ -311,7 +326,7 @@ private:
     {
       Entry *e = entries + i;
       *e = src[i];
-      Entry **head = &m_buckets[m_traits.Hash(Traits::KeyOf(*e)) % m_capacity];
+      Entry **head = &m_buckets[Bucket(m_traits.Hash(Traits::KeyOf(*e)))];
       e->next = *head;
       *head = e;
     }
@@ -333,7 +348,7 @@ private:
     Entry *oldEntries = Entries();
     const int n = m_size;
     m_buckets = static_cast<Entry **>(block);
-    m_capacity = static_cast<unsigned>(capacity);
+    SetCapacity(capacity);
     std::memset(static_cast<void *>(m_buckets), 0, capacity * sizeof(Entry *));
     m_nextFree = reinterpret_cast<Entry *>(m_buckets + capacity);
     Relink(oldEntries, n);
@@ -343,6 +358,7 @@ private:
   }
 
   unsigned m_capacity = 0;
+  std::uint64_t m_modMultiplier = 0;
   Entry **m_buckets = nullptr;
   Entry *m_nextFree = nullptr;
   Entry *m_inlineBuckets[kInlineCapacity];
