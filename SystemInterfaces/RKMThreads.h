@@ -11,7 +11,8 @@ typedef int (*RKMThreadFunction)(void *argument);
 
 /// A thread running a function. Run starts it; a thread that cannot start is reported by Run's result,
 /// never thrown. The destructor joins a thread still running. Begin and End are hooks that a derived
-/// class may override; they run on the thread around the function.
+/// class may override; they run on the thread around the function, so such a class joins in its own
+/// destructor (the base's join would come after the derived part is gone).
 class RKM_EXPORT RKMThreads
 {
 public:
