@@ -47,7 +47,9 @@ constexpr bool kPooling = false;
 constexpr bool kPooling = true;
 #endif
 
-void *TakeFromClass(size_t index)
+// Moves up to n blocks of a class from the shared list (carving a new chunk when it is empty) onto a
+// private list; gives the number moved, 0 when memory runs out.
+int TakeBatch(size_t index, FreeBlock *&head, int n)
 {
   SizeClass &c = Class(index);
   std::lock_guard<std::mutex> guard(c.lock);
@@ -56,7 +58,7 @@ void *TakeFromClass(size_t index)
     const size_t stride = kHeader + index * kGranule;
     char *chunk = static_cast<char *>(std::malloc(kChunkBytes));
     if (!chunk)
-      return nullptr;
+      return 0;
     // Chunks are never returned: the pool lives as long as the process.
     for (size_t off = 0; off + stride <= kChunkBytes; off += stride)
     {
@@ -65,9 +67,72 @@ void *TakeFromClass(size_t index)
       c.free = b;
     }
   }
-  FreeBlock *b = c.free;
-  c.free = b->next;
+  int moved = 0;
+  while (c.free && moved < n)
+  {
+    FreeBlock *b = c.free;
+    c.free = b->next;
+    b->next = head;
+    head = b;
+    ++moved;
+  }
+  return moved;
+}
+
+// Moves n blocks from a private list back to the shared one.
+void GiveBatch(size_t index, FreeBlock *&head, int n)
+{
+  SizeClass &c = Class(index);
+  std::lock_guard<std::mutex> guard(c.lock);
+  while (head && n-- > 0)
+  {
+    FreeBlock *b = head;
+    head = b->next;
+    b->next = c.free;
+    c.free = b;
+  }
+}
+
+// Each thread keeps a short list per class, so most allocations and releases touch no lock. The lists
+// go back to the shared ones in batches, and wholly when the thread ends, so a block freed by another
+// thread than the one that took it is simply reused there.
+constexpr int kBatch = 32;
+struct ThreadCache
+{
+  FreeBlock *head[kClasses + 1] = {};
+  int count[kClasses + 1] = {};
+  ~ThreadCache()
+  {
+    for (size_t i = 1; i <= kClasses; ++i)
+      GiveBatch(i, head[i], count[i]);
+  }
+};
+
+thread_local ThreadCache t_cache;
+
+void *TakeFromClass(size_t index)
+{
+  ThreadCache &cache = t_cache;
+  if (!cache.head[index])
+    cache.count[index] = TakeBatch(index, cache.head[index], kBatch);
+  FreeBlock *b = cache.head[index];
+  if (!b)
+    return nullptr;
+  cache.head[index] = b->next;
+  --cache.count[index];
   return b;
+}
+
+void ReturnToClass(size_t index, FreeBlock *b)
+{
+  ThreadCache &cache = t_cache;
+  b->next = cache.head[index];
+  cache.head[index] = b;
+  if (++cache.count[index] > 2 * kBatch)
+  {
+    GiveBatch(index, cache.head[index], kBatch);
+    cache.count[index] -= kBatch;
+  }
 }
 
 RKMSysPool *DefaultPool()
@@ -134,11 +199,7 @@ void RKMSpecializedDelete(void *block, RKMSysPool *, unsigned)
     std::free(raw);
     return;
   }
-  SizeClass &c = Class(tag);
-  std::lock_guard<std::mutex> guard(c.lock);
-  FreeBlock *b = reinterpret_cast<FreeBlock *>(raw);
-  b->next = c.free;
-  c.free = b;
+  ReturnToClass(tag, reinterpret_cast<FreeBlock *>(raw));
 }
 
 const char *RKMSysGetPoolName(const RKMSysPool *pool) { return pool ? pool->name.c_str() : nullptr; }
