@@ -54,6 +54,16 @@ public:
   double SquareDistanceMin(const RKMMathPoint &p) const { return m_base.SquareDistanceTo(p); }
   double SquareDistanceMax(const RKMPolyOBB &other) const { return m_base.MaxSquareDistanceTo(other.m_base); }
   double SquareDistanceMax(const RKMMathPoint &p) const { return m_base.MaxSquareDistanceTo(p); }
+  /// Whether the other box, moved along the line of direction (either sense), meets this one; the
+  /// smallest squared travel in squareDistance (0 when they overlap). A direction of squared length
+  /// ≤ 1e-6 gives false with the output untouched; otherwise the output is 1e49 when they never meet.
+  unsigned char SquareDistanceMinDir(const RKMPolyOBB &other, const RKMMathVector &direction,
+                                     double &squareDistance) const;
+  /// The same for a sphere (centre, radius) moved along the line of direction. An overlapping sphere
+  /// gives true with 0 whatever the direction; a direction of squared length ≤ 1e-6 otherwise gives
+  /// false with the output untouched.
+  unsigned char SquareDistanceMinDir(const RKMMathPoint &center, double radius, const RKMMathVector &direction,
+                                     double &squareDistance) const;
   OBBOverlap Test(const RKMPolyOBB &other) const
   {
     return m_base.IsIntersecting(other.m_base) ? OBBIntersecting : OBBDisjoint;

@@ -20,7 +20,11 @@ public:
   RKMMathVector GetRow(int row) const { return {m[row][0], m[row][1], m[row][2]}; }
   RKMMathVector GetColumn(int col) const { return {m[0][col], m[1][col], m[2][col]}; }
 
-  RKMMathVector operator*(const RKMMathVector &v) const;
+  RKMMathVector operator*(const RKMMathVector &v) const
+  {
+    return {m[0][0] * v.x + m[0][1] * v.y + m[0][2] * v.z, m[1][0] * v.x + m[1][1] * v.y + m[1][2] * v.z,
+            m[2][0] * v.x + m[2][1] * v.y + m[2][2] * v.z};
+  }
   RKMMath3x3Matrix operator*(const RKMMath3x3Matrix &b) const;
   bool operator==(const RKMMath3x3Matrix &b) const;
   bool operator!=(const RKMMath3x3Matrix &b) const { return !(*this == b); }

@@ -14,9 +14,9 @@ public:
   /// The translation by t.
   explicit RKMMathTransformation(const RKMMathVector &translation);
 
-  RKMMathPoint operator*(const RKMMathPoint &p) const;
+  RKMMathPoint operator*(const RKMMathPoint &p) const { return RKMMathPoint(m_matrix * p.AsVector() + m_translation); }
   /// Vectors are mapped by the matrix only.
-  RKMMathVector operator*(const RKMMathVector &v) const;
+  RKMMathVector operator*(const RKMMathVector &v) const { return m_matrix * v; }
   /// Composition: (this * b) applies b first.
   RKMMathTransformation operator*(const RKMMathTransformation &b) const;
   bool operator==(const RKMMathTransformation &b) const;

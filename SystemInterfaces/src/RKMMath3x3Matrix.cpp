@@ -16,13 +16,6 @@ RKMMath3x3Matrix RKMMath3x3Matrix::FromColumns(const RKMMathVector &c0, const RK
   return RKMMath3x3Matrix(c0.x, c1.x, c2.x, c0.y, c1.y, c2.y, c0.z, c1.z, c2.z);
 }
 
-RKMMathVector RKMMath3x3Matrix::operator*(const RKMMathVector &v) const
-{
-  return {m[0][0] * v.x + m[0][1] * v.y + m[0][2] * v.z,
-          m[1][0] * v.x + m[1][1] * v.y + m[1][2] * v.z,
-          m[2][0] * v.x + m[2][1] * v.y + m[2][2] * v.z};
-}
-
 RKMMath3x3Matrix RKMMath3x3Matrix::operator*(const RKMMath3x3Matrix &b) const
 {
   RKMMath3x3Matrix r;

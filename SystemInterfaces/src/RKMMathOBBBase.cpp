@@ -21,6 +21,48 @@ double Norm1(const RKMMathVector &v) { return std::fabs(v.x) + std::fabs(v.y) + 
 double Norm1(const RKMMathPoint &p) { return std::fabs(p.x) + std::fabs(p.y) + std::fabs(p.z); }
 
 double HalfSum(const RKMMathVector &h) { return h.x + h.y + h.z; }
+
+// The separating-axis frame of box b seen from box a: R[i][j] = Ai·Bj, t the centre offset along a's
+// axes. visit(projection, ra, rb, slack, cosine) is called for the 3 + 3 face axes (cosine 0) and the
+// 9 cross axes Ai × Bj (cosine Ai·Bj, whose length is √(1 − cosine²)), until it returns false; the
+// result is whether it never did. |R| is padded against near-parallel axes, so that rounding never
+// invents a separating axis.
+template <class Visit>
+bool ForEachSeparatingAxis(const RKMMathOBBBase &A, const RKMMathOBBBase &B, Visit visit)
+{
+  double R[3][3], AbsR[3][3], t[3];
+  const RKMMathVector d = B.Center() - A.Center();
+  for (int i = 0; i < 3; ++i)
+  {
+    t[i] = d * A.Axis(i);
+    for (int j = 0; j < 3; ++j)
+    {
+      R[i][j] = A.Axis(i) * B.Axis(j);
+      AbsR[i][j] = std::fabs(R[i][j]) + kParallel;
+    }
+  }
+  const double *a = &A.Diagonal().x, *b = &B.Diagonal().x;
+  const double slack = kSlack * (Norm1(d) + HalfSum(A.Diagonal()) + HalfSum(B.Diagonal()));
+  for (int i = 0; i < 3; ++i)
+    if (!visit(t[i], a[i], b[0] * AbsR[i][0] + b[1] * AbsR[i][1] + b[2] * AbsR[i][2], slack, 0.0))
+      return false;
+  for (int j = 0; j < 3; ++j)
+    if (!visit(t[0] * R[0][j] + t[1] * R[1][j] + t[2] * R[2][j],
+               a[0] * AbsR[0][j] + a[1] * AbsR[1][j] + a[2] * AbsR[2][j], b[j], slack, 0.0))
+      return false;
+  for (int i = 0; i < 3; ++i)
+  {
+    const int i1 = (i + 1) % 3, i2 = (i + 2) % 3;
+    for (int j = 0; j < 3; ++j)
+    {
+      const int j1 = (j + 1) % 3, j2 = (j + 2) % 3;
+      if (!visit(t[i2] * R[i1][j] - t[i1] * R[i2][j], a[i1] * AbsR[i2][j] + a[i2] * AbsR[i1][j],
+                 b[j1] * AbsR[i][j2] + b[j2] * AbsR[i][j1], slack, R[i][j]))
+        return false;
+    }
+  }
+  return true;
+}
 }
 
 RKMMathOBBBase::RKMMathOBBBase()
@@ -60,9 +102,15 @@ unsigned char RKMMathOBBBase::IsContaining(const RKMMathPoint &p, double toleran
   return 1;
 }
 
-unsigned char RKMMathOBBBase::IsIntersecting(const RKMMathOBBBase &other) const
+unsigned char RKMMathOBBBase::IsIntersecting(const RKMMathOBBBase &b) const
 {
-  return IsDefined() && other.IsDefined() && SquareDistanceTo(other) == 0.0;
+  if (!IsDefined() || !b.IsDefined())
+    return 0;
+  // Stops at the first axis that separates. Along a cross-product axis every term scales with the
+  // axis' length (at most 1), so the unscaled slack is on the safe side there too.
+  return ForEachSeparatingAxis(*this, b, [](double projection, double ra, double rb, double slack, double) {
+    return !(std::fabs(projection) > ra + rb + slack);
+  });
 }
 
 void RKMMathOBBBase::Inflate(double d)
@@ -96,45 +144,19 @@ double RKMMathOBBBase::SquareDistanceTo(const RKMMathOBBBase &b) const
 {
   if (!IsDefined() || !b.IsDefined())
     return RKMdoubleMax;
-  // Separating-axis test in this box's frame: R[i][j] = Ai·Bj, t = the centre offset in this frame.
-  double R[3][3], AbsR[3][3], t[3];
-  const RKMMathVector d = b.m_center - m_center;
-  for (int i = 0; i < 3; ++i)
-  {
-    t[i] = d * m_axes[i];
-    for (int j = 0; j < 3; ++j)
-    {
-      R[i][j] = m_axes[i] * b.m_axes[j];
-      AbsR[i][j] = std::fabs(R[i][j]) + kParallel;
-    }
-  }
-  const double *a = &m_half.x, *bh = &b.m_half.x;
-  const double slack = kSlack * (Norm1(d) + HalfSum(m_half) + HalfSum(b.m_half));
+  // The largest gap over the 15 axes, each gap divided by its axis' length (sin of the angle between
+  // the two box axes it crosses); nearly parallel pairs add nothing the face axes miss.
   double gap = 0.0;
-  auto consider = [&](double projection, double ra, double rb, double length) {
-    const double g = (std::fabs(projection) - ra - rb - slack) / length;
-    if (g > gap)
-      gap = g;
-  };
-  for (int i = 0; i < 3; ++i)
-    consider(t[i], a[i], bh[0] * AbsR[i][0] + bh[1] * AbsR[i][1] + bh[2] * AbsR[i][2], 1.0);
-  for (int j = 0; j < 3; ++j)
-    consider(t[0] * R[0][j] + t[1] * R[1][j] + t[2] * R[2][j],
-             a[0] * AbsR[0][j] + a[1] * AbsR[1][j] + a[2] * AbsR[2][j], bh[j], 1.0);
-  for (int i = 0; i < 3; ++i)
-  {
-    const int i1 = (i + 1) % 3, i2 = (i + 2) % 3;
-    for (int j = 0; j < 3; ++j)
+  ForEachSeparatingAxis(*this, b, [&gap](double projection, double ra, double rb, double slack, double cosine) {
+    const double length = std::sqrt(std::fmax(0.0, 1.0 - cosine * cosine));
+    if (length >= 1e-6)
     {
-      const int j1 = (j + 1) % 3, j2 = (j + 2) % 3;
-      // |Ai × Bj| = sin of their angle; nearly parallel axes add nothing the face axes miss.
-      const double length = std::sqrt(std::fmax(0.0, 1.0 - R[i][j] * R[i][j]));
-      if (length < 1e-6)
-        continue;
-      consider(t[i2] * R[i1][j] - t[i1] * R[i2][j], a[i1] * AbsR[i2][j] + a[i2] * AbsR[i1][j],
-               bh[j1] * AbsR[i][j2] + bh[j2] * AbsR[i][j1], length);
+      const double g = (std::fabs(projection) - ra - rb - slack) / length;
+      if (g > gap)
+        gap = g;
     }
-  }
+    return true;
+  });
   if (std::isnan(gap))
     return 0.0;
   return gap * gap;
@@ -269,6 +291,20 @@ RKMMathOBBBase operator*(const RKMMathTransformation &T, const RKMMathOBBBase &b
   for (int k = 0; k < 3; ++k)
     e[k] = M * box.Axis(k) * box.Diagonal()[k];
   const RKMMathPoint center = T * box.Center();
+  // A rigid linear part maps the axes onto orthonormal ones: the image is the box itself, with the
+  // half-sizes grown by the tiny departure from orthonormality that rounding leaves.
+  const RKMMathVector m0 = M * box.Axis(0), m1 = M * box.Axis(1), m2 = M * box.Axis(2);
+  const double rigidity = std::fmax(std::fmax(std::fabs(m0 * m0 - 1.0), std::fabs(m1 * m1 - 1.0)),
+                                    std::fmax(std::fabs(m2 * m2 - 1.0), std::fmax(std::fabs(m0 * m1),
+                                                                                  std::fmax(std::fabs(m0 * m2), std::fabs(m1 * m2)))));
+  if (rigidity <= 1e-12 && std::isfinite(center.x) && std::isfinite(center.y) && std::isfinite(center.z))
+  {
+    const RKMMathVector axes[3] = {m0, m1, m2};
+    const RKMMathVector &h = box.Diagonal();
+    // A cross term u_i·(m_i·m_j) can carry up to 1e-12 of any half-size into axis j.
+    const double grow = 1.0 + 4e-12, pad = 4e-12 * HalfSum(h) + kSlack * Norm1(center);
+    return RKMMathOBBBase(axes, RKMMathVector(h.x * grow + pad, h.y * grow + pad, h.z * grow + pad), center);
+  }
   bool finite = std::isfinite(center.x) && std::isfinite(center.y) && std::isfinite(center.z);
   double largest = 0.0;
   for (int k = 0; k < 3; ++k)

@@ -7,13 +7,6 @@ RKMMathTransformation::RKMMathTransformation(const RKMMath3x3Matrix &matrix, con
 
 RKMMathTransformation::RKMMathTransformation(const RKMMathVector &translation) : m_translation(translation) {}
 
-RKMMathPoint RKMMathTransformation::operator*(const RKMMathPoint &p) const
-{
-  return RKMMathPoint(m_matrix * p.AsVector() + m_translation);
-}
-
-RKMMathVector RKMMathTransformation::operator*(const RKMMathVector &v) const { return m_matrix * v; }
-
 RKMMathTransformation RKMMathTransformation::operator*(const RKMMathTransformation &b) const
 {
   return RKMMathTransformation(m_matrix * b.m_matrix, m_matrix * b.m_translation + m_translation);
