@@ -3,6 +3,8 @@
 #include "RKMRefCounted.h"
 #include "RKMSysTypes.h"
 
+#include <vector>
+
 /// A link of a doubly linked chain of observers of type T (T derives from RKMPolyObserver<T>). The
 /// owner of a chain holds one reference on its first element and every element one on its successor.
 /// Links cannot be copied: a copy would hold the same successor twice.
@@ -55,6 +57,49 @@ public:
     observer->m_next = nullptr;
     observer->m_prev = nullptr;
     observer->Release();
+  }
+
+  /// Copies the chain from head into copy, taking one reference on each observer, so that every one of
+  /// them stays alive while it is notified even if the chain changes meanwhile (the caller holds the
+  /// chain's lock during the copy, not during the notification). Memory shortage shortens the copy.
+  static void Snapshot(T *head, std::vector<T *> &copy)
+  {
+    try
+    {
+      for (T *o = head; o; o = o->m_next)
+        copy.push_back(o);
+    }
+    catch (...)
+    {
+    }
+    for (T *o : copy)
+      o->AddRef();
+  }
+
+  /// Releases the references Snapshot took.
+  static void ReleaseSnapshot(std::vector<T *> &copy)
+  {
+    for (T *o : copy)
+      o->Release();
+    copy.clear();
+  }
+
+  /// Empties the chain from head: each observer is unlinked before the chain's reference to it is
+  /// dropped, so that one still held elsewhere keeps no link to, or reference on, the others.
+  static void ReleaseChain(T *&head)
+  {
+    T *o = head;
+    head = nullptr;
+    while (o)
+    {
+      T *next = o->m_next;
+      o->m_next = nullptr;
+      o->m_prev = nullptr;
+      if (next)
+        next->m_prev = nullptr;
+      o->Release();
+      o = next;
+    }
   }
 
   /// True when o is this element or follows it in the chain.

@@ -107,6 +107,32 @@ bool Collect(RKMBVHNodeIterator &leaves, std::vector<RKMBVHNodeConst *> &usable)
   return true;
 }
 
+// The common start: E_INVALIDARG for an iterator empty at once or without usable leaf.
+HRESULT Start(RKMBVHNodeIterator &leaves, std::vector<RKMBVHNodeConst *> &usable)
+{
+  leaves.Begin();
+  if (leaves.End())
+    return E_INVALIDARG;
+  if (!Collect(leaves, usable))
+    return E_OUTOFMEMORY;
+  return usable.empty() ? E_INVALIDARG : S_OK;
+}
+
+// One leaf: the tree's root is the leaf itself. More: one root over all of them, its volume started
+// from the second leaf's and grown over each.
+HRESULT Flat(Build &build, const std::vector<RKMBVHNodeConst *> &usable, RKMBVHTree *&tree)
+{
+  if (usable.size() == 1)
+    return build.Finish(usable[0], tree);
+  RKMBVHNode *root = build.Empty(usable[1]);
+  if (!root)
+    return E_OUTOFMEMORY;
+  for (RKMBVHNodeConst *leaf : usable)
+    if (root->AbsorbChild(leaf) <= 0)
+      return E_OUTOFMEMORY;
+  return build.Finish(root, tree);
+}
+
 int Cell(double v, double lower, double scale)
 {
   // Clamped into the grid: a centre on the upper limit, or a NaN, still lands in a cell.
@@ -155,51 +181,24 @@ RKMBVHNode *RKMBVHTreeBuilder::GetUnionFather(RKMBVHNodeConst *a, RKMBVHNodeCons
 
 HRESULT RKMBVHTreeBuilder::RunNoOptim(RKMBVHNodeIterator &leaves, RKMBVHTree *&tree) const
 {
-  leaves.Begin();
-  if (leaves.End())
-    return E_INVALIDARG;
   std::vector<RKMBVHNodeConst *> usable;
-  if (!Collect(leaves, usable))
-    return E_OUTOFMEMORY;
-  if (usable.empty())
-    return E_INVALIDARG;
+  const HRESULT hr = Start(leaves, usable);
+  if (FAILED(hr))
+    return hr;
   Build build;
-  if (usable.size() == 1)
-    return build.Finish(usable[0], tree);
-  // The root's volume starts from the second usable leaf's, then grows over every leaf.
-  RKMBVHNode *root = build.Empty(usable[1]);
-  if (!root)
-    return E_OUTOFMEMORY;
-  for (RKMBVHNodeConst *leaf : usable)
-    if (root->AbsorbChild(leaf) <= 0)
-      return E_OUTOFMEMORY;
-  return build.Finish(root, tree);
+  return Flat(build, usable, tree);
 }
 
 HRESULT RKMBVHTreeBuilder::RunBasic(RKMBVHNodeIterator &leaves, RKMBVHTree *&tree) const
 {
-  leaves.Begin();
-  if (leaves.End())
-    return E_INVALIDARG;
   std::vector<RKMBVHNodeConst *> usable;
-  if (!Collect(leaves, usable))
-    return E_OUTOFMEMORY;
+  const HRESULT hr = Start(leaves, usable);
+  if (FAILED(hr))
+    return hr;
   const size_t n = usable.size();
-  if (n == 0)
-    return E_INVALIDARG;
   Build build;
-  if (n == 1)
-    return build.Finish(usable[0], tree);
-  if (n == 2)
-  {
-    RKMBVHNode *root = build.Empty(usable[1]);
-    if (!root)
-      return E_OUTOFMEMORY;
-    for (RKMBVHNodeConst *leaf : usable)
-      if (root->AbsorbChild(leaf) <= 0)
-        return E_OUTOFMEMORY;
-    return build.Finish(root, tree);
-  }
+  if (n <= 2)
+    return Flat(build, usable, tree);
 
   constexpr int kCells = 16 * 16 * 16;
   std::vector<RKMMathPoint> centres;
@@ -291,15 +290,11 @@ HRESULT RKMBVHTreeBuilder::RunBasic(RKMBVHNodeIterator &leaves, RKMBVHTree *&tre
 
 HRESULT RKMBVHTreeBuilder::RunBest(RKMBVHNodeIterator &leaves, RKMBVHTree *&tree) const
 {
-  leaves.Begin();
-  if (leaves.End())
-    return E_INVALIDARG;
   std::vector<RKMBVHNodeConst *> usable;
-  if (!Collect(leaves, usable))
-    return E_OUTOFMEMORY;
+  const HRESULT hr = Start(leaves, usable);
+  if (FAILED(hr))
+    return hr;
   const size_t n = usable.size();
-  if (n == 0)
-    return E_INVALIDARG;
   Build build;
   if (n == 1)
     return build.Finish(usable[0], tree);

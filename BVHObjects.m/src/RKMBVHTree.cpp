@@ -20,23 +20,9 @@ RKMBVHTree::RKMBVHTree(RKMBVHNode *root) : m_root(nullptr)
 RKMBVHTree::~RKMBVHTree()
 {
   Notify(Notice::Deletion);
-  RKMBVHTreeObserver *first = nullptr;
   {
     RKMPolyScopedMutex lock(m_observerLock);
-    first = m_observers;
-    m_observers = nullptr;
-  }
-  // Each observer is unlinked before the chain's reference to it is dropped: an observer that a caller
-  // still holds must not keep the later ones linked (and referenced) after the tree is gone.
-  while (first)
-  {
-    RKMBVHTreeObserver *next = first->Next();
-    first->SetNext(nullptr);
-    first->SetPrev(nullptr);
-    if (next)
-      next->SetPrev(nullptr);
-    first->Release();
-    first = next;
+    RKMPolyObserver<RKMBVHTreeObserver>::ReleaseChain(m_observers);
   }
   delete m_root;
   m_root = nullptr;
@@ -66,22 +52,10 @@ void RKMBVHTree::UnregisterObserver(RKMBVHTreeObserver *observer)
 
 void RKMBVHTree::Notify(Notice notice)
 {
-  // The chain is copied under the lock, each observer with a reference of its own: an observer may then
-  // unregister itself or another during the calls (the lock is not held) and every one copied stays
-  // alive until its turn has passed.
   std::vector<RKMBVHTreeObserver *> observers;
   {
     RKMPolyScopedMutex lock(m_observerLock);
-    try
-    {
-      for (RKMBVHTreeObserver *o = m_observers; o; o = o->Next())
-        observers.push_back(o);
-    }
-    catch (...)
-    {
-    }
-    for (RKMBVHTreeObserver *o : observers)
-      o->AddRef();
+    RKMPolyObserver<RKMBVHTreeObserver>::Snapshot(m_observers, observers);
   }
   for (RKMBVHTreeObserver *o : observers)
   {
@@ -90,8 +64,7 @@ void RKMBVHTree::Notify(Notice notice)
     else
       o->OnTreeFlush();
   }
-  for (RKMBVHTreeObserver *o : observers)
-    o->Release();
+  RKMPolyObserver<RKMBVHTreeObserver>::ReleaseSnapshot(observers);
 }
 
 void RKMBVHTree::FlushMemory()

@@ -121,18 +121,7 @@ RKMBVHTreeSet::~RKMBVHTreeSet()
   if (m_type == 0)
     if (MonitorFunction f = Monitor(false))
       f(this);
-  RKMBVHTreeSetObserver *first = m_observers;
-  m_observers = nullptr;
-  while (first)
-  {
-    RKMBVHTreeSetObserver *next = first->Next();
-    first->SetNext(nullptr);
-    first->SetPrev(nullptr);
-    if (next)
-      next->SetPrev(nullptr);
-    first->Release();
-    first = next;
-  }
+  RKMPolyObserver<RKMBVHTreeSetObserver>::ReleaseChain(m_observers);
   // The mutex goes last: nothing above may need it once it is gone.
   delete m_mutex;
   m_mutex = nullptr;
@@ -141,26 +130,15 @@ RKMBVHTreeSet::~RKMBVHTreeSet()
 template <class Call>
 void RKMBVHTreeSet::Notify(Call call)
 {
-  // As for trees: a copy of the chain, each observer kept alive through its call.
   std::vector<RKMBVHTreeSetObserver *> observers;
   if (m_mutex)
     (m_mutex->*RKMMutex::LockF)();
-  try
-  {
-    for (RKMBVHTreeSetObserver *o = m_observers; o; o = o->Next())
-      observers.push_back(o);
-  }
-  catch (...)
-  {
-  }
-  for (RKMBVHTreeSetObserver *o : observers)
-    o->AddRef();
+  RKMPolyObserver<RKMBVHTreeSetObserver>::Snapshot(m_observers, observers);
   if (m_mutex)
     (m_mutex->*RKMMutex::UnlockF)();
   for (RKMBVHTreeSetObserver *o : observers)
     call(*o);
-  for (RKMBVHTreeSetObserver *o : observers)
-    o->Release();
+  RKMPolyObserver<RKMBVHTreeSetObserver>::ReleaseSnapshot(observers);
 }
 
 RKMBVHNode *RKMBVHTreeSet::Leaf(int id) const
