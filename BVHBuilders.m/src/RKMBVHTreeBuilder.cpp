@@ -19,6 +19,18 @@ namespace
 {
 bool Usable(const RKMBVHNode *n) { return n && n->GetFirstBoundingVolume(); }
 
+// A new node without children whose volume is a clone of model's first volume; null when memory runs out.
+RKMBVHNode *NodeLike(const RKMBVHNodeConst *model)
+{
+  RKMPolyBoundingVolume *volume = RKMPolyBVClone::Clone(model->GetFirstBoundingVolume());
+  if (!volume)
+    return nullptr;
+  RKMBVHNode *node = new RKMBVHNode(volume);
+  if (!node)
+    delete volume;
+  return node;
+}
+
 // The inner nodes of one build. On failure they are unlinked from their children (the leaves stay the
 // caller's, the inner nodes are freed one by one) and deleted.
 class Build
@@ -51,15 +63,9 @@ public:
   // A new inner node without children, its volume cloned from model's. Null when memory runs out.
   RKMBVHNode *Empty(const RKMBVHNodeConst *model)
   {
-    RKMPolyBoundingVolume *volume = RKMPolyBVClone::Clone(model->GetFirstBoundingVolume());
-    if (!volume)
-      return nullptr;
-    RKMBVHNode *node = new RKMBVHNode(volume);
+    RKMBVHNode *node = NodeLike(model);
     if (!node)
-    {
-      delete volume;
       return nullptr;
-    }
     try
     {
       m_inner.push_back(node);
@@ -165,15 +171,9 @@ RKMBVHNode *RKMBVHTreeBuilder::GetUnionFather(RKMBVHNodeConst *a, RKMBVHNodeCons
 {
   if (!a || !b || !a->GetFirstBoundingVolume() || !b->GetFirstBoundingVolume())
     return nullptr;
-  RKMPolyBoundingVolume *volume = RKMPolyBVClone::Clone(a->GetFirstBoundingVolume());
-  if (!volume)
-    return nullptr;
-  RKMBVHNode *node = new RKMBVHNode(volume);
+  RKMBVHNode *node = NodeLike(a);
   if (!node)
-  {
-    delete volume;
     return nullptr;
-  }
   node->AbsorbChild(a);
   node->AbsorbChild(b);
   return node;
