@@ -1,0 +1,157 @@
+#pragma once
+
+#include <cstdint>
+
+#include "RKMExport.h"
+#include "RKMMathPoint.h"
+#include "RKMMathPoint2D.h"
+#include "RKMSysTypes.h"
+
+class RKMPolyAdaptivePredicates;
+
+/// The coordinate grid and exact sign tests for one set of data. In the Gridded mode coordinates are
+/// snapped to multiples of 2ε inside [-P, P], P the smallest power of two not below the announced
+/// maximum and ε = P·2^-23, so that every grid coordinate has at most 24 significant bits and the
+/// orientation tests are exact on them. In the Adaptive modes coordinates are left as they are and
+/// the signs come from adaptive expansion arithmetic, exact for any finite double. Read-only after
+/// SetMaxCoord: one configured instance may serve several threads.
+class RKM_EXPORT RKMPolyExactArithmetic
+{
+public:
+  /// Any other stored value makes the orientation tests answer 0 and snapping do nothing.
+  enum Mode : std::int32_t
+  {
+    Gridded = 0,
+    Adaptive = 1,
+    /// Behaves exactly as Adaptive.
+    Adaptive2 = 2
+  };
+
+  /// Sets the maximum coordinate to 100000 (P = 131072, ε = 2^-6).
+  explicit RKMPolyExactArithmetic(Mode mode = Gridded);
+  ~RKMPolyExactArithmetic();
+  RKMPolyExactArithmetic(const RKMPolyExactArithmetic &) = delete;
+  RKMPolyExactArithmetic &operator=(const RKMPolyExactArithmetic &) = delete;
+
+  /// Stores M and derives the grid from it. S_OK for a positive finite M up to 2^127. Any other value
+  /// still gets a usable grid and E_INVALIDARG: |M| for a negative M, the finest float grid
+  /// (P = 2^-126) for 0, the coarsest (P = 2^127) for NaN, an infinity or M above 2^127.
+  HRESULT SetMaxCoord(float M);
+  /// M as given to SetMaxCoord, even when it was not usable as such.
+  float GetMaxCoord() const { return m_maxCoord; }
+  /// ε: half the grid step.
+  double GetCoordinatePrecision() const { return m_precision; }
+  Mode GetMode() const { return m_mode; }
+  /// M snapped in the Gridded mode, M itself otherwise.
+  float GetMaxNormalizedCoord() const;
+
+  /// Snap to the nearest grid coordinate in the Gridded mode; no change in any other mode. A value
+  /// beyond ±P becomes RKMMathInfinite as a float. A double is rounded to float first.
+  void Normalize(float &v) const;
+  void Normalize(double &v) const;
+  void Normalize(RKMMathPoint2D &p) const;
+  void Normalize(RKMMathPoint &p) const;
+  /// The snap of Normalize(float&) whatever the mode.
+  void Grid(float &v) const;
+  /// 1 when the three values lie in [-P, P], bounds included; 0 otherwise (NaN included).
+  int IsPointInMAX23Range(float x, float y, float z) const;
+
+  /// -1, 0 or 1; 0 also when either is NaN.
+  int Compare(double a, double b) const;
+  /// 1 when every coordinate pair compares equal; a NaN makes it 0.
+  int Equal(double a, double b) const;
+  int Equal(const RKMMathPoint2D &a, const RKMMathPoint2D &b) const;
+  int Equal(const RKMMathPoint &a, const RKMMathPoint &b) const;
+  int CompareBelowAbove(const RKMMathPoint2D &a, const RKMMathPoint2D &b) const;
+  int CompareLeftRight(const RKMMathPoint2D &a, const RKMMathPoint2D &b) const;
+
+  /// +1 when a, b, c run counter-clockwise, -1 clockwise, 0 collinear. Exact on grid coordinates in
+  /// the Gridded mode, on any finite doubles in the Adaptive modes.
+  int Orientation2D(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c) const
+  {
+    return Orientation2D(&a.x, &b.x, &c.x);
+  }
+  /// Each pointer addresses an x, y pair.
+  int Orientation2D(const double *a, const double *b, const double *c) const;
+  /// The sign of ((b − a) × (c − a)) · (d − a): +1 when d lies on the side the normal of a, b, c
+  /// points to. Exact as Orientation2D.
+  int Orientation3D(const RKMMathPoint &a, const RKMMathPoint &b, const RKMMathPoint &c,
+                    const RKMMathPoint &d) const
+  {
+    return Orientation3D(&a.x, &b.x, &c.x, &d.x);
+  }
+  /// Each pointer addresses an x, y, z triple.
+  int Orientation3D(const double *a, const double *b, const double *c, const double *d) const;
+  /// +1 when d lies strictly inside the circle through a, b, c, -1 outside, 0 on it, whatever the
+  /// orientation of a, b, c; always through the adaptive kernel, so exact in every mode.
+  int InCircle(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c,
+               const RKMMathPoint2D &d) const;
+
+private:
+  int GriddedOrientation2D(const double *a, const double *b, const double *c) const;
+  int GriddedOrientation3D(const double *a, const double *b, const double *c, const double *d) const;
+  int AdaptiveOrientation2D(const double *a, const double *b, const double *c) const;
+  int AdaptiveOrientation3D(const double *a, const double *b, const double *c, const double *d) const;
+  /// The exact stage of the gridded 3D test alone.
+  int ExactOrientation3D(const double *a, const double *b, const double *c, const double *d) const;
+  void Split(double a, double &high, double &low, const double &S) const;
+  float Snap(float v) const;
+
+  double m_precision = 0.0;
+  double m_rangeBound = 0.0;
+  double m_snapConstant = 0.0;
+  double m_splitConstant = 0.0;
+  double m_staticFilter3 = 0.0;
+  double m_relativeError = 0.0;
+  double m_filterFloor = 0.0;
+  Mode m_mode;
+  float m_maxCoord = -1.0f;
+  RKMPolyAdaptivePredicates *m_kernel = nullptr;
+};
+
+/// Lexicographic comparisons, -1 / 0 / 1; NaN coordinates count as equal, so these are not strict
+/// weak orders when NaNs are present. BelowAbove orders by y then x (2D), or z, y, x (3D).
+RKM_EXPORT int RKMPolyCompareBelowAbove(const RKMMathPoint2D &a, const RKMMathPoint2D &b);
+RKM_EXPORT int RKMPolyCompareBelowAbove(const RKMMathPoint &a, const RKMMathPoint &b);
+/// Orders by x then y (2D), or x, y, z (3D).
+RKM_EXPORT int RKMPolyCompareLeftRight(const RKMMathPoint2D &a, const RKMMathPoint2D &b);
+RKM_EXPORT int RKMPolyCompareLeftRight(const RKMMathPoint &a, const RKMMathPoint &b);
+
+inline int RKMPolyExactArithmetic::Orientation2D(const double *a, const double *b, const double *c) const
+{
+  if (m_mode == Gridded)
+  {
+    // On grid coordinates the differences take 24 bits and their products 48, so det is exact; the
+    // exact stage only settles what the absolute threshold leaves open.
+    const double det = (a[0] - c[0]) * (b[1] - c[1]) - (b[0] - c[0]) * (a[1] - c[1]);
+    if (det > 1e-15)
+      return 1;
+    if (det < -1e-15)
+      return -1;
+    return GriddedOrientation2D(a, b, c);
+  }
+  return AdaptiveOrientation2D(a, b, c);
+}
+
+inline int RKMPolyExactArithmetic::Orientation3D(const double *a, const double *b, const double *c,
+                                                 const double *d) const
+{
+  if (m_mode == Gridded)
+  {
+    // Static filter: on grid coordinates the rounding error of det stays below 1.125·2^23·ε³, a
+    // quarter of the bound, with or without fused multiply-adds (they only remove roundings).
+    const double Bx = b[0] - a[0], By = b[1] - a[1], Bz = b[2] - a[2];
+    const double Cx = c[0] - a[0], Cy = c[1] - a[1], Cz = c[2] - a[2];
+    const double Dx = d[0] - a[0], Dy = d[1] - a[1], Dz = d[2] - a[2];
+    const double m1 = Dz * Cy - Dy * Cz;
+    const double m2 = Dz * By - Dy * Bz;
+    const double m3 = Cz * By - Cy * Bz;
+    const double det = (m1 * Bx - m2 * Cx) + m3 * Dx;
+    if (det > m_staticFilter3)
+      return 1;
+    if (det < -m_staticFilter3)
+      return -1;
+    return GriddedOrientation3D(a, b, c, d);
+  }
+  return AdaptiveOrientation3D(a, b, c, d);
+}
