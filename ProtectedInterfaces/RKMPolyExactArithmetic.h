@@ -104,6 +104,7 @@ private:
   double m_staticFilter3 = 0.0;
   double m_relativeError = 0.0;
   double m_filterFloor = 0.0;
+  double m_splitConstant2D = 0.0;
   Mode m_mode;
   float m_maxCoord = -1.0f;
   RKMPolyAdaptivePredicates *m_kernel = nullptr;
@@ -124,10 +125,11 @@ inline int RKMPolyExactArithmetic::Orientation2D(const double *a, const double *
     // On grid coordinates the differences take 24 bits and their products 48, so det is exact; the
     // exact stage only settles what the absolute threshold leaves open.
     const double det = (a[0] - c[0]) * (b[1] - c[1]) - (b[0] - c[0]) * (a[1] - c[1]);
-    if (det > 1e-15)
-      return 1;
-    if (det < -1e-15)
-      return -1;
+    // Computed without branching on the sign, which is unpredictable; only the rare fall-through
+    // to the exact stage branches.
+    const int s = (det > 1e-15) - (det < -1e-15);
+    if (__builtin_expect(s != 0, 1))
+      return s;
     return GriddedOrientation2D(a, b, c);
   }
   return AdaptiveOrientation2D(a, b, c);
@@ -147,10 +149,9 @@ inline int RKMPolyExactArithmetic::Orientation3D(const double *a, const double *
     const double m2 = Dz * By - Dy * Bz;
     const double m3 = Cz * By - Cy * Bz;
     const double det = (m1 * Bx - m2 * Cx) + m3 * Dx;
-    if (det > m_staticFilter3)
-      return 1;
-    if (det < -m_staticFilter3)
-      return -1;
+    const int s = (det > m_staticFilter3) - (det < -m_staticFilter3);
+    if (__builtin_expect(s != 0, 1))
+      return s;
     return GriddedOrientation3D(a, b, c, d);
   }
   return AdaptiveOrientation3D(a, b, c, d);

@@ -2,12 +2,18 @@
 
 #include <cmath>
 
+#include "RKMPolyExactArithmetic.h"
+#include "RKMPolyExactBigSign.h"
+
 // Expansion arithmetic: a value is held exactly as a sum of doubles of increasing magnitude that do
 // not overlap. Every primitive below relies on each operation being rounded to nearest on its own;
 // a fused multiply-add in Split would leave a high half of more than 26 bits and break TwoProduct.
 
 namespace
 {
+
+// Below this a product may have underflowed; shortcuts taken on smaller values are not trusted.
+constexpr double kUnderflowGuard = 0x1p-900;
 
 inline void TwoSum(double a, double b, double &x, double &y)
 {
@@ -269,28 +275,39 @@ RKMPolyAdaptivePredicates::RKMPolyAdaptivePredicates()
   iccerrboundC = (44.0 + 576.0 * epsilon) * epsilon * epsilon;
 }
 
-double RKMPolyAdaptivePredicates::orient2d(const double *pa, const double *pb, const double *pc) const
+inline double RKMPolyAdaptivePredicates::orient2d(const double *pa, const double *pb, const double *pc) const
 {
-  const double detleft = (pa[0] - pc[0]) * (pb[1] - pc[1]);
-  const double detright = (pa[1] - pc[1]) * (pb[0] - pc[0]);
+  const double acx = pa[0] - pc[0], bcy = pb[1] - pc[1], acy = pa[1] - pc[1], bcx = pb[0] - pc[0];
+  const double detleft = acx * bcy;
+  const double detright = acy * bcx;
   const double det = detleft - detright;
+  // Each shortcut below is trusted only well above the subnormal range, where a product that
+  // underflowed cannot have lost anything that matters; an overflow gives inf or NaN, which none of
+  // them accepts.
   double detsum;
   if (detleft > 0.0)
   {
-    if (detright <= 0.0)
+    if (detright <= 0.0 && std::fabs(det) >= kUnderflowGuard)
       return det;
     detsum = detleft + detright;
   }
   else if (detleft < 0.0)
   {
-    if (detright >= 0.0)
+    if (detright >= 0.0 && std::fabs(det) >= kUnderflowGuard)
       return det;
     detsum = -detleft - detright;
   }
   else
-    return det;
+  {
+    if (std::fabs(det) >= kUnderflowGuard)
+      return det;
+    // Both products vanish through a zero factor, as on axis-aligned input: exactly zero.
+    if (detright == 0.0 && (acx == 0.0 || bcy == 0.0) && (acy == 0.0 || bcx == 0.0))
+      return 0.0;
+    detsum = std::fabs(detright);
+  }
   const double errbound = ccwerrboundA * detsum;
-  if (det >= errbound || -det >= errbound)
+  if ((det >= errbound || -det >= errbound) && detsum >= kUnderflowGuard)
     return det;
   return orient2dadapt(pa, pb, pc, detsum);
 }
@@ -298,6 +315,10 @@ double RKMPolyAdaptivePredicates::orient2d(const double *pa, const double *pb, c
 double RKMPolyAdaptivePredicates::orient2dadapt(const double *pa, const double *pb, const double *pc,
                                                 double detsum) const
 {
+  // Outside the safe range the expansions could overflow or lose error terms to underflow.
+  if (!RKMPolyExactBigSign::InSafeRange(pa, 2) || !RKMPolyExactBigSign::InSafeRange(pb, 2) ||
+      !RKMPolyExactBigSign::InSafeRange(pc, 2))
+    return RKMPolyExactBigSign::Orient2D(pa, pb, pc);
   const double acx = pa[0] - pc[0];
   const double bcx = pb[0] - pc[0];
   const double acy = pa[1] - pc[1];
@@ -345,7 +366,7 @@ double RKMPolyAdaptivePredicates::orient2dadapt(const double *pa, const double *
   return D[dlen - 1];
 }
 
-double RKMPolyAdaptivePredicates::orient3d(const double *pa, const double *pb, const double *pc,
+inline double RKMPolyAdaptivePredicates::orient3d(const double *pa, const double *pb, const double *pc,
                                            const double *pd) const
 {
   const double adx = pa[0] - pd[0], bdx = pb[0] - pd[0], cdx = pc[0] - pd[0];
@@ -361,7 +382,11 @@ double RKMPolyAdaptivePredicates::orient3d(const double *pa, const double *pb, c
                            (std::fabs(cdxady) + std::fabs(adxcdy)) * std::fabs(bdz) +
                            (std::fabs(adxbdy) + std::fabs(bdxady)) * std::fabs(cdz);
   const double errbound = o3derrboundA * permanent;
-  if (det > errbound || -det > errbound)
+  // A product that underflowed lost at most 2^-1075, then scaled by a z difference: far below the
+  // slack of the bound when the permanent clears this floor. Overflows give inf or NaN, never a
+  // decision.
+  if ((det > errbound || -det > errbound) &&
+      permanent >= 0x1p-960 * (1.0 + std::fmax(std::fabs(adz), std::fmax(std::fabs(bdz), std::fabs(cdz)))))
     return det;
   return orient3dadapt(pa, pb, pc, pd, permanent);
 }
@@ -369,6 +394,9 @@ double RKMPolyAdaptivePredicates::orient3d(const double *pa, const double *pb, c
 double RKMPolyAdaptivePredicates::orient3dadapt(const double *pa, const double *pb, const double *pc,
                                                 const double *pd, double permanent) const
 {
+  if (!RKMPolyExactBigSign::InSafeRange(pa, 3) || !RKMPolyExactBigSign::InSafeRange(pb, 3) ||
+      !RKMPolyExactBigSign::InSafeRange(pc, 3) || !RKMPolyExactBigSign::InSafeRange(pd, 3))
+    return -RKMPolyExactBigSign::Orient3D(pa, pb, pc, pd);
   const double adx = pa[0] - pd[0], bdx = pb[0] - pd[0], cdx = pc[0] - pd[0];
   const double ady = pa[1] - pd[1], bdy = pb[1] - pd[1], cdy = pc[1] - pd[1];
   const double adz = pa[2] - pd[2], bdz = pb[2] - pd[2], cdz = pc[2] - pd[2];
@@ -443,7 +471,7 @@ double RKMPolyAdaptivePredicates::orient3dadapt(const double *pa, const double *
   return total[ltot - 1];
 }
 
-double RKMPolyAdaptivePredicates::incircle(const double *pa, const double *pb, const double *pc,
+inline double RKMPolyAdaptivePredicates::incircle(const double *pa, const double *pb, const double *pc,
                                            const double *pd) const
 {
   const double adx = pa[0] - pd[0], bdx = pb[0] - pd[0], cdx = pc[0] - pd[0];
@@ -461,7 +489,10 @@ double RKMPolyAdaptivePredicates::incircle(const double *pa, const double *pb, c
                            (std::fabs(cdxady) + std::fabs(adxcdy)) * blift +
                            (std::fabs(adxbdy) + std::fabs(bdxady)) * clift;
   const double errbound = iccerrboundA * permanent;
-  if (det > errbound || -det > errbound)
+  // As in orient3d: underflowed products are scaled by a lift or a minor at most.
+  const double scale = 1.0 + alift + blift + clift + std::fabs(bdxcdy) + std::fabs(cdxbdy) + std::fabs(cdxady) +
+                       std::fabs(adxcdy) + std::fabs(adxbdy) + std::fabs(bdxady);
+  if ((det > errbound || -det > errbound) && permanent >= 0x1p-960 * scale)
     return det;
   return incircleadapt(pa, pb, pc, pd, permanent);
 }
@@ -469,6 +500,9 @@ double RKMPolyAdaptivePredicates::incircle(const double *pa, const double *pb, c
 double RKMPolyAdaptivePredicates::incircleadapt(const double *pa, const double *pb, const double *pc,
                                                 const double *pd, double permanent) const
 {
+  if (!RKMPolyExactBigSign::InSafeRange(pa, 2) || !RKMPolyExactBigSign::InSafeRange(pb, 2) ||
+      !RKMPolyExactBigSign::InSafeRange(pc, 2) || !RKMPolyExactBigSign::InSafeRange(pd, 2))
+    return RKMPolyExactBigSign::InCircle(pa, pb, pc, pd);
   const double adx = pa[0] - pd[0], bdx = pb[0] - pd[0], cdx = pc[0] - pd[0];
   const double ady = pa[1] - pd[1], bdy = pb[1] - pd[1], cdy = pc[1] - pd[1];
 
@@ -540,4 +574,35 @@ double RKMPolyAdaptivePredicates::incircleadapt(const double *pa, const double *
   const int l01 = ExpansionSum(tlen[0], terms[0], tlen[1], terms[1], sum01);
   const int ltot = ExpansionSum(l01, sum01, tlen[2], terms[2], total);
   return total[ltot - 1];
+}
+
+// The adaptive members of the arithmetic live beside the kernel so that its filters inline into them.
+
+int RKMPolyExactArithmetic::AdaptiveOrientation2D(const double *a, const double *b, const double *c) const
+{
+  if ((m_mode != Adaptive && m_mode != Adaptive2) || !m_kernel)
+    return 0;
+  const double r = m_kernel->orient2d(a, b, c);
+  return (r > 0.0) - (r < 0.0);
+}
+
+int RKMPolyExactArithmetic::AdaptiveOrientation3D(const double *a, const double *b, const double *c,
+                                                  const double *d) const
+{
+  if ((m_mode != Adaptive && m_mode != Adaptive2) || !m_kernel)
+    return 0;
+  // The kernel's positive side is the opposite one.
+  const double r = m_kernel->orient3d(a, b, c, d);
+  return (r < 0.0) - (r > 0.0);
+}
+
+int RKMPolyExactArithmetic::InCircle(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c,
+                                     const RKMMathPoint2D &d) const
+{
+  if (!m_kernel)
+    return 0;
+  double r = m_kernel->incircle(&a.x, &b.x, &c.x, &d.x);
+  if (m_kernel->orient2d(&a.x, &b.x, &c.x) < 0.0)
+    r = -r;
+  return (r > 0.0) - (r < 0.0);
 }

@@ -25,9 +25,11 @@ public:
   double iccerrboundA, iccerrboundB, iccerrboundC;
 
 private:
-  double orient2dadapt(const double *pa, const double *pb, const double *pc, double detsum) const;
-  double orient3dadapt(const double *pa, const double *pb, const double *pc, const double *pd,
+  // The stages after the first filter, kept out of line so the filters inline into their callers.
+  // Inputs outside the range where expansions stay exact go to the integer fallback.
+  [[gnu::noinline]] double orient2dadapt(const double *pa, const double *pb, const double *pc, double detsum) const;
+  [[gnu::noinline]] double orient3dadapt(const double *pa, const double *pb, const double *pc, const double *pd,
                        double permanent) const;
-  double incircleadapt(const double *pa, const double *pb, const double *pc, const double *pd,
+  [[gnu::noinline]] double incircleadapt(const double *pa, const double *pb, const double *pc, const double *pd,
                        double permanent) const;
 };

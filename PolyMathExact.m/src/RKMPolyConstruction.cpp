@@ -35,10 +35,11 @@ bool CrossingFraction(double d0, double d1, double &t)
   return std::isfinite(t);
 }
 
-// first + t·(second − first), or second when rounding pushed t beyond 1.
+// first + t·(second − first). At t = 1 (the second end on the plane, or rounding beyond it) the
+// second end itself: rebuilding it as first + (second − first) could round off it.
 RKMMathPoint Interpolate(const RKMMathPoint &first, const RKMMathPoint &second, double t)
 {
-  if (t > 1.0)
+  if (t >= 1.0)
     return second;
   return RKMMathPoint((second.x - first.x) * t + first.x, (second.y - first.y) * t + first.y,
                       (second.z - first.z) * t + first.z);

@@ -60,6 +60,10 @@ HRESULT RKMPolyExactArithmetic::SetMaxCoord(float M)
   m_staticFilter3 = 1.125 * 0x1p25 * eps * eps * eps;
   m_relativeError = 1.5 * 0x1p-52;
   m_filterFloor = 0.5 * eps * eps * eps;
+  // The 2D exact stage splits coordinate differences, not products of two: its constant scales with
+  // ε, its ulp 2^12 grid steps, so that both halves stay on the grid on every grid. The 3D split
+  // constant, scaled with ε², would not dominate a difference when ε is below about 2^-54.
+  m_splitConstant2D = 1.5 * 0x1p65 * eps;
   return hr;
 }
 
@@ -161,8 +165,8 @@ int RKMPolyExactArithmetic::GriddedOrientation2D(const double *a, const double *
   const double s1 = c[1] - a[1];
   const double s2 = b[1] - a[1];
   double high1, low1, high2, low2;
-  Split(s1, high1, low1, m_splitConstant);
-  Split(s2, high2, low2, m_splitConstant);
+  Split(s1, high1, low1, m_splitConstant2D);
+  Split(s2, high2, low2, m_splitConstant2D);
   const double r = (low1 * u - low2 * w) + (high1 * u - high2 * w);
   return r > 0.0 ? 1 : (r < 0.0 ? -1 : 0);
 }
@@ -214,35 +218,6 @@ int RKMPolyExactArithmetic::ExactOrientation3D(const double *a, const double *b,
   Split(m2, high2, low2, m_splitConstant);
   Split(m3, high3, low3, m_splitConstant);
   const double r = (low1 * Bx - low2 * Cx + low3 * Dx) + (high1 * Bx - high2 * Cx + high3 * Dx);
-  return r > 0.0 ? 1 : (r < 0.0 ? -1 : 0);
-}
-
-int RKMPolyExactArithmetic::AdaptiveOrientation2D(const double *a, const double *b, const double *c) const
-{
-  if ((m_mode != Adaptive && m_mode != Adaptive2) || !m_kernel)
-    return 0;
-  const double r = m_kernel->orient2d(a, b, c);
-  return r > 0.0 ? 1 : (r < 0.0 ? -1 : 0);
-}
-
-int RKMPolyExactArithmetic::AdaptiveOrientation3D(const double *a, const double *b, const double *c,
-                                                  const double *d) const
-{
-  if ((m_mode != Adaptive && m_mode != Adaptive2) || !m_kernel)
-    return 0;
-  // The kernel's positive side is the opposite one.
-  const double r = m_kernel->orient3d(a, b, c, d);
-  return r > 0.0 ? -1 : (r < 0.0 ? 1 : 0);
-}
-
-int RKMPolyExactArithmetic::InCircle(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c,
-                                     const RKMMathPoint2D &d) const
-{
-  if (!m_kernel)
-    return 0;
-  double r = m_kernel->incircle(&a.x, &b.x, &c.x, &d.x);
-  if (m_kernel->orient2d(&a.x, &b.x, &c.x) < 0.0)
-    r = -r;
   return r > 0.0 ? 1 : (r < 0.0 ? -1 : 0);
 }
 

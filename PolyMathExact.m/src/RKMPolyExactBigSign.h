@@ -1,0 +1,37 @@
+#pragma once
+
+#include <array>
+#include <cmath>
+#include <cstdint>
+
+// Exact signs of the orientation and in-circle determinants by integer arithmetic, for inputs whose
+// magnitudes put the expansion arithmetic out of its range: products that overflow, or error terms
+// that fall below the smallest subnormal and are lost. Every double of the input is an integer
+// times 2^e; scaled by the smallest exponent present they all become integers of at most 2100 bits,
+// and the determinants are polynomials of degree at most four in them. Slow, and only for those
+// inputs. A coordinate that is not finite gives 0.
+class RKMPolyExactBigSign
+{
+public:
+  /// Sign of (a − c) × (b − c) over x, y pairs: +1 counter-clockwise.
+  static int Orient2D(const double *a, const double *b, const double *c);
+  /// Sign of ((b − a) × (c − a)) · (d − a).
+  static int Orient3D(const double *a, const double *b, const double *c, const double *d);
+  /// Sign of the lifted determinant relative to d: positive when d is inside the circle through a,
+  /// b, c given counter-clockwise.
+  static int InCircle(const double *a, const double *b, const double *c, const double *d);
+
+  /// True when every non-zero value lies in [2^-150, 2^150]: then every difference, every product of
+  /// up to four of them and every rounding error of those products is a double with no overflow and
+  /// no loss to the subnormal range, which the expansion arithmetic needs to be exact.
+  static bool InSafeRange(const double *v, int n)
+  {
+    for (int i = 0; i < n; ++i)
+    {
+      const double m = std::fabs(v[i]);
+      if (m != 0.0 && !(m >= 0x1p-150 && m <= 0x1p150))
+        return false;
+    }
+    return true;
+  }
+};
