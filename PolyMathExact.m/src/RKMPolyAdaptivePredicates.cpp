@@ -281,34 +281,16 @@ inline double RKMPolyAdaptivePredicates::orient2d(const double *pa, const double
   const double detleft = acx * bcy;
   const double detright = acy * bcx;
   const double det = detleft - detright;
-  // Each shortcut below is trusted only well above the subnormal range, where a product that
-  // underflowed cannot have lost anything that matters; an overflow gives inf or NaN, which none of
-  // them accepts.
-  double detsum;
-  if (detleft > 0.0)
-  {
-    if (detright <= 0.0 && std::fabs(det) >= kUnderflowGuard)
-      return det;
-    detsum = detleft + detright;
-  }
-  else if (detleft < 0.0)
-  {
-    if (detright >= 0.0 && std::fabs(det) >= kUnderflowGuard)
-      return det;
-    detsum = -detleft - detright;
-  }
-  else
-  {
-    if (std::fabs(det) >= kUnderflowGuard)
-      return det;
-    // Both products vanish through a zero factor, as on axis-aligned input: exactly zero.
-    if (detright == 0.0 && (acx == 0.0 || bcy == 0.0) && (acy == 0.0 || bcx == 0.0))
-      return 0.0;
-    detsum = std::fabs(detright);
-  }
-  const double errbound = ccwerrboundA * detsum;
-  if ((det >= errbound || -det >= errbound) && detsum >= kUnderflowGuard)
+  // When the two products have opposite signs, or one is zero, |det| is detsum itself and passes
+  // the bound: one test covers every shortcut, with one predictable branch. It is trusted only well
+  // above the subnormal range, where a product that underflowed cannot have lost anything that
+  // matters; an overflow gives inf or NaN, which it never accepts.
+  const double detsum = std::fabs(detleft) + std::fabs(detright);
+  if (std::fabs(det) >= ccwerrboundA * detsum && detsum >= kUnderflowGuard)
     return det;
+  // Both products vanish through a zero factor, as on axis-aligned input: exactly zero.
+  if (detsum == 0.0 && (acx == 0.0 || bcy == 0.0) && (acy == 0.0 || bcx == 0.0))
+    return 0.0;
   return orient2dadapt(pa, pb, pc, detsum);
 }
 
@@ -318,7 +300,13 @@ double RKMPolyAdaptivePredicates::orient2dadapt(const double *pa, const double *
   // Outside the safe range the expansions could overflow or lose error terms to underflow.
   if (!RKMPolyExactBigSign::InSafeRange(pa, 2) || !RKMPolyExactBigSign::InSafeRange(pb, 2) ||
       !RKMPolyExactBigSign::InSafeRange(pc, 2))
+  {
+    const double *in[6] = {&pa[0], &pa[1], &pb[0], &pb[1], &pc[0], &pc[1]};
+    double s[6];
+    if (RKMPolyExactBigSign::ScaleIntoSafeRange(in, 6, s))
+      return orient2d(s, s + 2, s + 4);
     return RKMPolyExactBigSign::Orient2D(pa, pb, pc);
+  }
   const double acx = pa[0] - pc[0];
   const double bcx = pb[0] - pc[0];
   const double acy = pa[1] - pc[1];
@@ -385,8 +373,8 @@ inline double RKMPolyAdaptivePredicates::orient3d(const double *pa, const double
   // A product that underflowed lost at most 2^-1075, then scaled by a z difference: far below the
   // slack of the bound when the permanent clears this floor. Overflows give inf or NaN, never a
   // decision.
-  if ((det > errbound || -det > errbound) &&
-      permanent >= 0x1p-960 * (1.0 + std::fmax(std::fabs(adz), std::fmax(std::fabs(bdz), std::fabs(cdz)))))
+  if (std::fabs(det) > errbound &&
+      permanent >= 0x1p-960 * (1.0 + std::fabs(adz) + std::fabs(bdz) + std::fabs(cdz)))
     return det;
   return orient3dadapt(pa, pb, pc, pd, permanent);
 }
@@ -396,7 +384,14 @@ double RKMPolyAdaptivePredicates::orient3dadapt(const double *pa, const double *
 {
   if (!RKMPolyExactBigSign::InSafeRange(pa, 3) || !RKMPolyExactBigSign::InSafeRange(pb, 3) ||
       !RKMPolyExactBigSign::InSafeRange(pc, 3) || !RKMPolyExactBigSign::InSafeRange(pd, 3))
+  {
+    const double *in[12] = {&pa[0], &pa[1], &pa[2], &pb[0], &pb[1], &pb[2],
+                            &pc[0], &pc[1], &pc[2], &pd[0], &pd[1], &pd[2]};
+    double s[12];
+    if (RKMPolyExactBigSign::ScaleIntoSafeRange(in, 12, s))
+      return orient3d(s, s + 3, s + 6, s + 9);
     return -RKMPolyExactBigSign::Orient3D(pa, pb, pc, pd);
+  }
   const double adx = pa[0] - pd[0], bdx = pb[0] - pd[0], cdx = pc[0] - pd[0];
   const double ady = pa[1] - pd[1], bdy = pb[1] - pd[1], cdy = pc[1] - pd[1];
   const double adz = pa[2] - pd[2], bdz = pb[2] - pd[2], cdz = pc[2] - pd[2];
@@ -492,7 +487,7 @@ inline double RKMPolyAdaptivePredicates::incircle(const double *pa, const double
   // As in orient3d: underflowed products are scaled by a lift or a minor at most.
   const double scale = 1.0 + alift + blift + clift + std::fabs(bdxcdy) + std::fabs(cdxbdy) + std::fabs(cdxady) +
                        std::fabs(adxcdy) + std::fabs(adxbdy) + std::fabs(bdxady);
-  if ((det > errbound || -det > errbound) && permanent >= 0x1p-960 * scale)
+  if (std::fabs(det) > errbound && permanent >= 0x1p-960 * scale)
     return det;
   return incircleadapt(pa, pb, pc, pd, permanent);
 }
@@ -502,7 +497,13 @@ double RKMPolyAdaptivePredicates::incircleadapt(const double *pa, const double *
 {
   if (!RKMPolyExactBigSign::InSafeRange(pa, 2) || !RKMPolyExactBigSign::InSafeRange(pb, 2) ||
       !RKMPolyExactBigSign::InSafeRange(pc, 2) || !RKMPolyExactBigSign::InSafeRange(pd, 2))
+  {
+    const double *in[8] = {&pa[0], &pa[1], &pb[0], &pb[1], &pc[0], &pc[1], &pd[0], &pd[1]};
+    double s[8];
+    if (RKMPolyExactBigSign::ScaleIntoSafeRange(in, 8, s))
+      return incircle(s, s + 2, s + 4, s + 6);
     return RKMPolyExactBigSign::InCircle(pa, pb, pc, pd);
+  }
   const double adx = pa[0] - pd[0], bdx = pb[0] - pd[0], cdx = pc[0] - pd[0];
   const double ady = pa[1] - pd[1], bdy = pb[1] - pd[1], cdy = pc[1] - pd[1];
 

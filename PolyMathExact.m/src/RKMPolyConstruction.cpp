@@ -18,6 +18,18 @@ RKMMathBox BoxOf(const RKMMathPoint &a, const RKMMathPoint &b)
   return box;
 }
 
+// v scaled by a power of two so that its largest component lies in [1, 2): only a direction is
+// needed from it, and the products formed with it then neither overflow nor underflow where the
+// coordinates themselves are huge or tiny. Zero and non-finite vectors are returned as they are.
+RKMMathVector Direction(const RKMMathVector &v)
+{
+  const double m = std::fmax(std::fabs(v.x), std::fmax(std::fabs(v.y), std::fabs(v.z)));
+  if (!(m > 0.0) || !std::isfinite(m))
+    return v;
+  const int e = std::ilogb(m);
+  return RKMMathVector(std::scalbn(v.x, -e), std::scalbn(v.y, -e), std::scalbn(v.z, -e));
+}
+
 bool IsFinite(const RKMMathPoint &p)
 {
   return std::isfinite(p.x) && std::isfinite(p.y) && std::isfinite(p.z);
@@ -49,7 +61,7 @@ RKMMathPoint Interpolate(const RKMMathPoint &first, const RKMMathPoint &second, 
 HRESULT RKMPolyConstruction::ConstructIntersection(const RKMMathPoint &p, const RKMMathPoint &q, const RKMMathPoint &a,
                                                    const RKMMathPoint &b, const RKMMathPoint &c, RKMMathPoint &out)
 {
-  const RKMMathVector n = (b - a) ^ (c - a);
+  const RKMMathVector n = Direction(Direction(b - a) ^ Direction(c - a));
   double t;
   if (!CrossingFraction((p - a) * n, (q - a) * n, t))
     return E_FAIL;
@@ -67,8 +79,8 @@ HRESULT RKMPolyConstruction::ConstructIntersection(const RKMMathPoint &p, const 
 HRESULT RKMPolyConstruction::ConstructIntersection(const RKMMathPoint &p0, const RKMMathPoint &p1,
                                                    const RKMMathPoint &q0, const RKMMathPoint &q1, RKMMathPoint &out)
 {
-  const RKMMathVector d0 = p1 - p0;
-  const RKMMathVector d1 = q1 - q0;
+  const RKMMathVector d0 = Direction(p1 - p0);
+  const RKMMathVector d1 = Direction(q1 - q0);
   const RKMMathVector n = d0 ^ d1;
   // Drop the axis along which the normal is largest; the kept pair (u, v) follows the cyclic order.
   int k = 0;

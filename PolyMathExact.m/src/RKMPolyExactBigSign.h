@@ -34,4 +34,31 @@ public:
     }
     return true;
   }
+
+  /// Copies n values into out scaled by one power of two that brings every non-zero one into
+  /// [2^-150, 2^150]; the scaling is exact there and leaves every sign of the homogeneous
+  /// determinants unchanged. False when their magnitudes spread too far for that (or one is not
+  /// finite): the integer path must decide.
+  static bool ScaleIntoSafeRange(const double *const *v, int n, double *out)
+  {
+    int emin = 1 << 20, emax = -(1 << 20);
+    for (int i = 0; i < n; ++i)
+    {
+      const double x = *v[i];
+      if (!std::isfinite(x))
+        return false;
+      if (x == 0.0)
+        continue;
+      const int e = std::ilogb(x);
+      emin = e < emin ? e : emin;
+      emax = e > emax ? e : emax;
+    }
+    // |x| lies in [2^e, 2^(e + 1)); centre the window.
+    const int k = -(emin + emax) / 2;
+    if (emin > emax || emin + k < -150 || emax + 1 + k > 150)
+      return false;
+    for (int i = 0; i < n; ++i)
+      out[i] = std::scalbn(*v[i], k);
+    return true;
+  }
 };

@@ -751,13 +751,14 @@ TEST(RKMPolyConstruction, SegmentTriangleFailures)
     EXPECT_EQ(RKMPolyConstruction::ConstructIntersection(p, q, RKMMathPoint(0, bad, 0), b, c, out), E_FAIL) << bad;
     EXPECT_TRUE(SameBits(out, kSentinel));
   }
-  // The normal overflows.
+  // A normal whose plain cross product would overflow still gives the crossing.
   const double big = 1e200;
+  RKMMathPoint far = kSentinel;
   EXPECT_EQ(RKMPolyConstruction::ConstructIntersection(RKMMathPoint(big, big, -big), RKMMathPoint(big, big, big),
                                                        a, RKMMathPoint(4 * big, 0, 0), RKMMathPoint(0, 4 * big, 0),
-                                                       out),
-            E_FAIL);
-  EXPECT_TRUE(SameBits(out, kSentinel));
+                                                       far),
+            S_OK);
+  EXPECT_TRUE(SameBits(far, RKMMathPoint(big, big, 0)));
 
   RKMMathPoint good = kSentinel;
   ASSERT_EQ(RKMPolyConstruction::ConstructIntersection(p, q, a, b, c, good), S_OK);
