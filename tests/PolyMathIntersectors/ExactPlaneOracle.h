@@ -1,0 +1,477 @@
+#pragma once
+
+// Exact rational reference for the plane intersectors. Every double converts to an mpq_class
+// without rounding, so the answers below are the true ones for the doubles the intersectors see,
+// whatever the arithmetic mode.
+
+#include <gmpxx.h>
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdint>
+#include <ostream>
+#include <random>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "RKMMathPoint2D.h"
+#include "RKMPolyExactArithmetic.h"
+#include "RKMPolyIntersectionPoint.h"
+
+namespace oracle
+{
+
+// Sanitized builds run the same randomized checks on fewer cases.
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr int kScale = 20;
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+constexpr int kScale = 20;
+#else
+constexpr int kScale = 1;
+#endif
+#else
+constexpr int kScale = 1;
+#endif
+
+using Mode = RKMPolyExactArithmetic::Mode;
+
+inline const char *ModeName(Mode m)
+{
+  return m == RKMPolyExactArithmetic::Gridded ? "Gridded" : "Adaptive";
+}
+
+struct QPoint
+{
+  mpq_class x, y;
+};
+
+inline QPoint Q(const RKMMathPoint2D &p)
+{
+  return {mpq_class(p.x), mpq_class(p.y)};
+}
+
+inline bool operator==(const QPoint &a, const QPoint &b)
+{
+  return a.x == b.x && a.y == b.y;
+}
+
+inline bool LexLess(const QPoint &a, const QPoint &b)
+{
+  return a.x < b.x || (a.x == b.x && a.y < b.y);
+}
+
+inline mpq_class Cross(const QPoint &a, const QPoint &b, const QPoint &c)
+{
+  return (b.x - a.x) * (c.y - a.y) - (b.y - a.y) * (c.x - a.x);
+}
+
+inline int Orient(const QPoint &a, const QPoint &b, const QPoint &c)
+{
+  return sgn(Cross(a, b, c));
+}
+
+// On the closed segment ab (a may equal b).
+inline bool OnClosedSegment(const QPoint &a, const QPoint &b, const QPoint &x)
+{
+  if (Orient(a, b, x) != 0)
+    return false;
+  return std::min(a.x, b.x) <= x.x && x.x <= std::max(a.x, b.x) && std::min(a.y, b.y) <= x.y &&
+         x.y <= std::max(a.y, b.y);
+}
+
+inline QPoint Lerp(const QPoint &a, const QPoint &b, const mpq_class &t)
+{
+  return {a.x + t * (b.x - a.x), a.y + t * (b.y - a.y)};
+}
+
+inline std::string Str(const QPoint &p)
+{
+  std::ostringstream s;
+  s << "(" << p.x.get_str() << "," << p.y.get_str() << ")";
+  return s.str();
+}
+
+inline std::string Str(const RKMMathPoint2D &p)
+{
+  std::ostringstream s;
+  s.precision(17);
+  s << "(" << p.x << "," << p.y << ")";
+  return s.str();
+}
+
+// A feature of one primitive as the intersection points describe it: type 1 vertex, 2 bar,
+// 3 triangle interior, 0 none.
+struct Feature
+{
+  int type = 0;
+  int index = 0;
+  bool operator==(const Feature &o) const { return type == o.type && index == o.index; }
+  bool operator!=(const Feature &o) const { return !(*this == o); }
+};
+
+inline Feature Slot(const RKMPolyIntersectionPoint &pt, int slot)
+{
+  return {pt.entityType[slot], pt.index[slot]};
+}
+
+inline std::string Str(const Feature &f)
+{
+  static const char *names[] = {"?", "V", "B", "T"};
+  std::ostringstream s;
+  s << (f.type >= 0 && f.type <= 3 ? names[f.type] : "!") << f.index;
+  return s.str();
+}
+
+inline std::string Str(const RKMPolyIntersectionPoint &pt)
+{
+  return Str(Slot(pt, 0)) + "x" + Str(Slot(pt, 1));
+}
+
+// The lowest-dimensional feature of triangle t (caller numbering) holding x; type 0 when x is
+// outside the closed triangle.
+inline Feature TriangleFeature(const QPoint t[3], const QPoint &x)
+{
+  for (int v = 0; v < 3; ++v)
+    if (t[v] == x)
+      return {1, v};
+  for (int e = 0; e < 3; ++e)
+    if (OnClosedSegment(t[e], t[(e + 1) % 3], x))
+      return {2, e};
+  const int o = Orient(t[0], t[1], t[2]);
+  for (int e = 0; e < 3; ++e)
+    if (Orient(t[e], t[(e + 1) % 3], x) != o)
+      return {0, 0};
+  return {3, 0};
+}
+
+// Segment p → q: vertex 0 is p, vertex 1 is q, bar 0 its open interior.
+inline Feature SegmentFeature(const QPoint &p, const QPoint &q, const QPoint &x)
+{
+  if (x == p)
+    return {1, 0};
+  if (x == q)
+    return {1, 1};
+  return OnClosedSegment(p, q, x) ? Feature{2, 0} : Feature{0, 0};
+}
+
+// The vertex orders of a triangle: query vertex k is base vertex kPerm[π][k]. The first three keep
+// the orientation, the last three reverse it.
+constexpr int kPerm[6][3] = {{0, 1, 2}, {1, 2, 0}, {2, 0, 1}, {0, 2, 1}, {2, 1, 0}, {1, 0, 2}};
+inline int PermSign(int p)
+{
+  return p < 3 ? 1 : -1;
+}
+
+// A base-numbering feature of a triangle expressed in the numbering of permutation p.
+inline Feature Renumber(const Feature &f, int p)
+{
+  const int *m = kPerm[p];
+  if (f.type == 1)
+  {
+    for (int k = 0; k < 3; ++k)
+      if (m[k] == f.index)
+        return {1, k};
+  }
+  else if (f.type == 2)
+  {
+    const int i = f.index, j = (f.index + 1) % 3;
+    for (int k = 0; k < 3; ++k)
+    {
+      const int u = m[k], w = m[(k + 1) % 3];
+      if ((u == i && w == j) || (u == j && w == i))
+        return {2, k};
+    }
+  }
+  return f;
+}
+
+// Strict convex hull, counter-clockwise, duplicates and points inside edges removed: one point for
+// a point set, two for a segment.
+inline std::vector<QPoint> ConvexHull(std::vector<QPoint> pts)
+{
+  std::sort(pts.begin(), pts.end(), LexLess);
+  pts.erase(std::unique(pts.begin(), pts.end()), pts.end());
+  if (pts.size() <= 2)
+    return pts;
+  std::vector<QPoint> h;
+  for (int pass = 0; pass < 2; ++pass)
+  {
+    const size_t base = h.size();
+    for (const QPoint &p : pts)
+    {
+      while (h.size() >= base + 2 && Orient(h[h.size() - 2], h.back(), p) <= 0)
+        h.pop_back();
+      h.push_back(p);
+    }
+    h.pop_back();
+    std::reverse(pts.begin(), pts.end());
+  }
+  return h;
+}
+
+// Sutherland–Hodgman step keeping the closed left side of the directed line ab.
+inline std::vector<QPoint> ClipLeft(const std::vector<QPoint> &poly, const QPoint &a, const QPoint &b)
+{
+  std::vector<QPoint> out;
+  const size_t n = poly.size();
+  for (size_t i = 0; i < n; ++i)
+  {
+    const QPoint &cur = poly[i], &nxt = poly[(i + 1) % n];
+    const mpq_class sc = Cross(a, b, cur), sn = Cross(a, b, nxt);
+    if (sgn(sc) >= 0)
+      out.push_back(cur);
+    if ((sgn(sc) > 0 && sgn(sn) < 0) || (sgn(sc) < 0 && sgn(sn) > 0))
+      out.push_back(Lerp(cur, nxt, sc / (sc - sn)));
+  }
+  return out;
+}
+
+// The intersection of two closed triangles: result 3/2/1/0 as the triangle intersector counts it, or
+// -6 for a degenerate triangle, with the corners counter-clockwise (the two ends for a segment).
+struct PolygonAnswer
+{
+  int result = 0;
+  std::vector<QPoint> corners;
+};
+
+inline PolygonAnswer IntersectTriangles(const QPoint t1[3], const QPoint t2[3])
+{
+  PolygonAnswer ans;
+  const int o1 = Orient(t1[0], t1[1], t1[2]), o2 = Orient(t2[0], t2[1], t2[2]);
+  if (o1 == 0 || o2 == 0)
+  {
+    ans.result = -6;
+    return ans;
+  }
+  std::vector<QPoint> poly{t1[0], t1[1], t1[2]};
+  if (o1 < 0)
+    std::swap(poly[1], poly[2]);
+  for (int e = 0; e < 3 && !poly.empty(); ++e)
+  {
+    const QPoint &a = t2[e], &b = t2[(e + 1) % 3];
+    poly = o2 > 0 ? ClipLeft(poly, a, b) : ClipLeft(poly, b, a);
+  }
+  ans.corners = ConvexHull(poly);
+  ans.result = ans.corners.size() >= 3 ? 3 : static_cast<int>(ans.corners.size());
+  return ans;
+}
+
+// The overlap of segment p → q with a closed triangle, as parameters along the segment in
+// increasing order; -5 for p == q, -6 for a degenerate triangle.
+struct ClipAnswer
+{
+  int result = 0;
+  std::vector<mpq_class> t;
+};
+
+inline ClipAnswer ClipSegment(const QPoint tri[3], const QPoint &p, const QPoint &q)
+{
+  ClipAnswer ans;
+  if (p == q)
+  {
+    ans.result = -5;
+    return ans;
+  }
+  const int o = Orient(tri[0], tri[1], tri[2]);
+  if (o == 0)
+  {
+    ans.result = -6;
+    return ans;
+  }
+  mpq_class lo = 0, hi = 1;
+  for (int e = 0; e < 3; ++e)
+  {
+    // f(t) = o · Cross(edge, p + t(q − p)) ≥ 0 on the triangle's side, affine in t.
+    const QPoint &a = tri[e], &b = tri[(e + 1) % 3];
+    const mpq_class f0 = o * Cross(a, b, p), f1 = o * Cross(a, b, q);
+    if (f0 == f1)
+    {
+      if (sgn(f0) < 0)
+        return ans;
+      continue;
+    }
+    const mpq_class tz = f0 / (f0 - f1);
+    if (f1 > f0)
+      lo = std::max(lo, tz);
+    else
+      hi = std::min(hi, tz);
+  }
+  if (lo > hi)
+    return ans;
+  ans.t.push_back(lo);
+  if (lo < hi)
+    ans.t.push_back(hi);
+  ans.result = static_cast<int>(ans.t.size());
+  return ans;
+}
+
+// Segments ab and cd as the segment intersector answers: -5, 0, 1 (with the point and its features)
+// or 2, and whether the four points lie on one line.
+struct CrossAnswer
+{
+  int result = 0;
+  bool colinear = false;
+  QPoint x;
+  Feature f[2];
+};
+
+inline CrossAnswer IntersectSegments(const QPoint &a, const QPoint &b, const QPoint &c, const QPoint &d)
+{
+  CrossAnswer ans;
+  if (a == b || c == d)
+  {
+    ans.result = -5;
+    return ans;
+  }
+  const int o1 = Orient(c, d, a), o2 = Orient(c, d, b), o3 = Orient(a, b, c), o4 = Orient(a, b, d);
+  if (o3 == 0 && o4 == 0)
+  {
+    ans.colinear = true;
+    // Positions along ab; the overlap of the two intervals decides.
+    auto s = [&](const QPoint &x) { return mpq_class((x.x - a.x) * (b.x - a.x) + (x.y - a.y) * (b.y - a.y)); };
+    const mpq_class a0 = 0, a1 = s(b);
+    mpq_class c0 = s(c), c1 = s(d);
+    if (c0 > c1)
+      std::swap(c0, c1);
+    const mpq_class lo = std::max(a0, c0), hi = std::min(a1, c1);
+    if (lo < hi)
+      ans.result = 2;
+    else if (lo == hi)
+    {
+      ans.result = 1;
+      ans.x = (lo == a0) ? a : b;
+    }
+    else
+      ans.result = 0;
+  }
+  else if (o1 * o2 > 0 || o3 * o4 > 0)
+    ans.result = 0;
+  else
+  {
+    ans.result = 1;
+    if (o1 == 0)
+      ans.x = a;
+    else if (o2 == 0)
+      ans.x = b;
+    else if (o3 == 0)
+      ans.x = c;
+    else if (o4 == 0)
+      ans.x = d;
+    else
+    {
+      const mpq_class ca = Cross(c, d, a), cb = Cross(c, d, b);
+      ans.x = Lerp(a, b, ca / (ca - cb));
+    }
+  }
+  if (ans.result == 1)
+  {
+    ans.f[0] = SegmentFeature(a, b, ans.x);
+    ans.f[1] = SegmentFeature(c, d, ans.x);
+  }
+  return ans;
+}
+
+// Point generators. All points of one case come from one small integer grid pushed through one
+// affine map, so that shared vertices, collinear edges and vertices on edges stay frequent.
+enum class Layout
+{
+  // Integers 0 … k: exact in every mode.
+  SmallGrid,
+  // Integer matrix, offset a multiple of 1/32: still on the default grid, and collinearity is kept.
+  Lattice,
+  // Arbitrary doubles: every product rounds, so the inputs are nearly, not exactly, degenerate.
+  // Only the Adaptive mode is exact on them.
+  Skewed,
+  // The small grid scaled by a power of two near the ends of the double range, where products of
+  // coordinates underflow or overflow; exact data for the Adaptive mode.
+  Extreme
+};
+
+inline const char *LayoutName(Layout l)
+{
+  static const char *names[] = {"SmallGrid", "Lattice", "Skewed", "Extreme"};
+  return names[static_cast<int>(l)];
+}
+
+class PointSource
+{
+public:
+  PointSource(std::uint64_t seed, Layout layout, int k) : m_rng(seed), m_layout(layout), m_k(k) {}
+
+  // A fresh map for the next case.
+  void NewCase()
+  {
+    if (m_layout == Layout::Lattice)
+    {
+      std::uniform_int_distribution<int> m(-40, 40), o(-32000, 32000);
+      do
+      {
+        for (double &v : m_m)
+          v = m(m_rng);
+      } while (m_m[0] * m_m[3] - m_m[1] * m_m[2] == 0);
+      m_o[0] = o(m_rng) / 32.0;
+      m_o[1] = o(m_rng) / 32.0;
+    }
+    else if (m_layout == Layout::Skewed)
+    {
+      std::uniform_real_distribution<double> m(-3.0, 3.0), o(-1000.0, 1000.0);
+      for (double &v : m_m)
+        v = m(m_rng);
+      m_o[0] = o(m_rng);
+      m_o[1] = o(m_rng);
+    }
+    else if (m_layout == Layout::Extreme)
+    {
+      static const int kExponents[] = {-1060, -700, -540, 520, 700, 1000};
+      const double s = std::ldexp(1.0, kExponents[m_rng() % 6]);
+      m_m[0] = m_m[3] = s;
+      m_m[1] = m_m[2] = 0;
+    }
+  }
+
+  RKMMathPoint2D Next()
+  {
+    std::uniform_int_distribution<int> g(0, m_k);
+    const double i = g(m_rng), j = g(m_rng);
+    if (m_layout == Layout::SmallGrid)
+      return {i, j};
+    return {m_o[0] + m_m[0] * i + m_m[1] * j, m_o[1] + m_m[2] * i + m_m[3] * j};
+  }
+
+  std::mt19937_64 &Rng() { return m_rng; }
+
+private:
+  std::mt19937_64 m_rng;
+  Layout m_layout;
+  int m_k;
+  double m_m[4] = {1, 0, 0, 1};
+  double m_o[2] = {0, 0};
+};
+
+// One randomized sweep: the mode, where the points come from, the grid size, how many cases and
+// the seed that reproduces them.
+struct SweepCase
+{
+  Mode mode;
+  Layout layout;
+  int k;
+  long count;
+  std::uint64_t seed;
+};
+
+// Readable and deterministic in test names and failure messages.
+inline void PrintTo(const SweepCase &c, std::ostream *os)
+{
+  *os << ModeName(c.mode) << " " << LayoutName(c.layout) << " 0.." << c.k << " x" << c.count;
+  *os << " seed " << c.seed;
+}
+
+inline std::string SweepName(const SweepCase &c)
+{
+  return std::string(ModeName(c.mode)) + "_" + LayoutName(c.layout) + std::to_string(c.k);
+}
+
+} // namespace oracle
