@@ -4,6 +4,9 @@
 #include "RKMListValRKMPolyIntersectionPoint.h"
 #include "RKMPolyIntersectionPointBuckets.h"
 
+// Callers store and exchange the records as six ints.
+static_assert(sizeof(RKMPolyIntersectionPoint) == 6 * sizeof(int), "an intersection point is six ints");
+
 namespace
 {
 const RKMPolyIntersectionPoint kZeroPoint;
