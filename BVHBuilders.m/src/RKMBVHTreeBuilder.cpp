@@ -149,7 +149,127 @@ int Cell(double v, double lower, double scale)
     return 15;
   return static_cast<int>(x);
 }
+
+// The grid hierarchy over three or more leaves: their centres binned into a 16 × 16 × 16 grid,
+// one node per occupied cell, reduced by 2 × 2 × 2 blocks. A cell that holds more than a handful of
+// leaves is gridded again over its own centres, a few times at most: left flat, a crowded cell makes
+// every pair walk through it test all its leaves against all of another's. Null when memory runs
+// out (oom set) or, should it happen, when nothing is left at the top.
+constexpr size_t kMaxCellLeaves = 8;
+constexpr int kMaxGridDepth = 3;
+
+RKMBVHNodeConst *GridTree(Build &build, const std::vector<RKMBVHNodeConst *> &usable, int depth, bool &oom)
+{
+  const size_t n = usable.size();
+  constexpr int kCells = 16 * 16 * 16;
+  std::vector<RKMMathPoint> centres;
+  // The grid lives on the heap: 4096 cell lists and node slots are too much for a thread's stack.
+  std::vector<std::vector<RKMBVHNodeConst *>> cells;
+  std::vector<RKMBVHNodeConst *> grid, level;
+  try
+  {
+    centres.reserve(n);
+    cells.resize(kCells);
+    grid.assign(kCells, nullptr);
+    level.reserve(kCells);
+  }
+  catch (...)
+  {
+    oom = true;
+    return nullptr;
+  }
+  RKMMathBox bounds;
+  for (RKMBVHNodeConst *leaf : usable)
+  {
+    centres.push_back(RKMPolyBVProperties::GetCenter(leaf->GetFirstBoundingVolume()));
+    bounds.AddInside(centres.back());
+  }
+  double lo[3], hi[3];
+  bounds.GetLimits(lo[0], hi[0], lo[1], hi[1], lo[2], hi[2]);
+  // The top grid keeps its leaves off the limits by a fixed margin in model units; a cell's own grid
+  // needs none (a centre on the upper limit is clamped into the last cell), and a fixed margin would
+  // swamp a small cell.
+  const double margin = depth == 0 ? 0.01 : 0.0;
+  double scale[3];
+  for (int a = 0; a < 3; ++a)
+  {
+    lo[a] -= margin;
+    hi[a] += margin;
+    scale[a] = 16.0 / (hi[a] - lo[a]);
+  }
+  try
+  {
+    for (size_t k = 0; k < n; ++k)
+    {
+      const int ix = Cell(centres[k].x, lo[0], scale[0]), iy = Cell(centres[k].y, lo[1], scale[1]),
+                iz = Cell(centres[k].z, lo[2], scale[2]);
+      cells[static_cast<size_t>((ix * 16 + iy) * 16 + iz)].push_back(usable[k]);
+    }
+  }
+  catch (...)
+  {
+    oom = true;
+    return nullptr;
+  }
+  // Level 0: one node per cell of two or more leaves.
+  for (int c = 0; c < kCells; ++c)
+  {
+    std::vector<RKMBVHNodeConst *> &cell = cells[static_cast<size_t>(c)];
+    if (cell.size() == 1)
+      grid[static_cast<size_t>(c)] = cell[0];
+    else if (cell.size() > 1)
+    {
+      // Only a cell that holds fewer than all the leaves is gridded again, so that coincident
+      // centres end in one flat node instead of recursing.
+      RKMBVHNodeConst *node = cell.size() > kMaxCellLeaves && depth < kMaxGridDepth && cell.size() < n
+                                  ? GridTree(build, cell, depth + 1, oom)
+                                  : build.Parent(cell.data(), cell.size());
+      if (!node)
+      {
+        oom = true;
+        return nullptr;
+      }
+      grid[static_cast<size_t>(c)] = node;
+    }
+  }
+  // Each coarser level gathers 2 × 2 × 2 cells; a single result passes up, never a one-child node.
+  for (int m = 8; m >= 1; m /= 2)
+  {
+    const int fine = 2 * m;
+    level.clear();
+    for (int x = 0; x < m; ++x)
+      for (int y = 0; y < m; ++y)
+        for (int z = 0; z < m; ++z)
+        {
+          RKMBVHNodeConst *gathered[8];
+          size_t count = 0;
+          for (int d = 0; d < 8; ++d)
+          {
+            const int fx = 2 * x + (d >> 2), fy = 2 * y + ((d >> 1) & 1), fz = 2 * z + (d & 1);
+            if (RKMBVHNodeConst *node = grid[static_cast<size_t>((fx * fine + fy) * fine + fz)])
+              gathered[count++] = node;
+          }
+          RKMBVHNodeConst *result = nullptr;
+          if (count == 1)
+            result = gathered[0];
+          else if (count > 1 && !(result = build.Parent(gathered, count)))
+          {
+            oom = true;
+            return nullptr;
+          }
+          grid[static_cast<size_t>((x * m + y) * m + z)] = result;
+          if (result)
+            level.push_back(result);
+        }
+  }
+  if (level.empty())
+    return nullptr;
+  RKMBVHNodeConst *root = level[0];
+  if (level.size() > 1 && !(root = build.Parent(level.data(), level.size())))
+    oom = true;
+  return oom ? nullptr : root;
 }
+} // namespace
 
 HRESULT RKMBVHTreeBuilder::Run(RKMBVHNodeIterator &leaves, RKMBVHTree *&tree) const
 {
@@ -195,96 +315,13 @@ HRESULT RKMBVHTreeBuilder::RunBasic(RKMBVHNodeIterator &leaves, RKMBVHTree *&tre
   const HRESULT hr = Start(leaves, usable);
   if (FAILED(hr))
     return hr;
-  const size_t n = usable.size();
   Build build;
-  if (n <= 2)
+  if (usable.size() <= 2)
     return Flat(build, usable, tree);
-
-  constexpr int kCells = 16 * 16 * 16;
-  std::vector<RKMMathPoint> centres;
-  // The grid lives on the heap: 4096 cell lists and node slots are too much for a thread's stack.
-  std::vector<std::vector<RKMBVHNodeConst *>> cells;
-  std::vector<RKMBVHNodeConst *> grid, level;
-  try
-  {
-    centres.reserve(n);
-    cells.resize(kCells);
-    grid.assign(kCells, nullptr);
-    level.reserve(kCells);
-  }
-  catch (...)
-  {
-    return E_OUTOFMEMORY;
-  }
-  RKMMathBox bounds;
-  for (RKMBVHNodeConst *leaf : usable)
-  {
-    centres.push_back(RKMPolyBVProperties::GetCenter(leaf->GetFirstBoundingVolume()));
-    bounds.AddInside(centres.back());
-  }
-  double lo[3], hi[3];
-  bounds.GetLimits(lo[0], hi[0], lo[1], hi[1], lo[2], hi[2]);
-  double scale[3];
-  for (int a = 0; a < 3; ++a)
-  {
-    lo[a] -= 0.01;
-    hi[a] += 0.01;
-    scale[a] = 16.0 / (hi[a] - lo[a]);
-  }
-  try
-  {
-    for (size_t k = 0; k < n; ++k)
-    {
-      const int ix = Cell(centres[k].x, lo[0], scale[0]), iy = Cell(centres[k].y, lo[1], scale[1]),
-                iz = Cell(centres[k].z, lo[2], scale[2]);
-      cells[static_cast<size_t>((ix * 16 + iy) * 16 + iz)].push_back(usable[k]);
-    }
-  }
-  catch (...)
-  {
-    return E_OUTOFMEMORY;
-  }
-  // Level 0: one node per cell of two or more leaves.
-  for (int c = 0; c < kCells; ++c)
-  {
-    std::vector<RKMBVHNodeConst *> &cell = cells[static_cast<size_t>(c)];
-    if (cell.size() == 1)
-      grid[static_cast<size_t>(c)] = cell[0];
-    else if (cell.size() > 1 && !(grid[static_cast<size_t>(c)] = build.Parent(cell.data(), cell.size())))
-      return E_OUTOFMEMORY;
-  }
-  // Each coarser level gathers 2 × 2 × 2 cells; a single result passes up, never a one-child node.
-  for (int m = 8; m >= 1; m /= 2)
-  {
-    const int fine = 2 * m;
-    level.clear();
-    for (int x = 0; x < m; ++x)
-      for (int y = 0; y < m; ++y)
-        for (int z = 0; z < m; ++z)
-        {
-          RKMBVHNodeConst *gathered[8];
-          size_t count = 0;
-          for (int d = 0; d < 8; ++d)
-          {
-            const int fx = 2 * x + (d >> 2), fy = 2 * y + ((d >> 1) & 1), fz = 2 * z + (d & 1);
-            if (RKMBVHNodeConst *node = grid[static_cast<size_t>((fx * fine + fy) * fine + fz)])
-              gathered[count++] = node;
-          }
-          RKMBVHNodeConst *result = nullptr;
-          if (count == 1)
-            result = gathered[0];
-          else if (count > 1 && !(result = build.Parent(gathered, count)))
-            return E_OUTOFMEMORY;
-          grid[static_cast<size_t>((x * m + y) * m + z)] = result;
-          if (result)
-            level.push_back(result);
-        }
-  }
-  if (level.empty())
-    return E_FAIL;
-  RKMBVHNodeConst *root = level[0];
-  if (level.size() > 1 && !(root = build.Parent(level.data(), level.size())))
-    return E_OUTOFMEMORY;
+  bool oom = false;
+  RKMBVHNodeConst *root = GridTree(build, usable, 0, oom);
+  if (!root)
+    return oom ? E_OUTOFMEMORY : E_FAIL;
   return build.Finish(root, tree);
 }
 

@@ -333,6 +333,37 @@ TEST(RKMBVHTreeBuilder, BasicHandlesAHundredThousandBoxes)
   EXPECT_EQ(set.deaths, 100000);
 }
 
+// Most leaves crowd around one point (as a detailed part of a mesh does in the grid of the whole):
+// their cells are gridded again, so no node ends with hundreds of children for a pair walk to test
+// against each other, and coincident centres still end in one flat node.
+TEST(RKMBVHTreeBuilder, BasicGridsCrowdedCellsAgain)
+{
+  const std::uint64_t seed = 4242;
+  SCOPED_TRACE("seed " + std::to_string(seed));
+  Rng g(seed);
+  LeafSet set;
+  FillRandom(set, g, 20000, true, 1000.0);
+  for (int i = 0; i < 20000; ++i)
+  {
+    const RKMMathPoint c = RandomPoint(g, 0.5);
+    set.Add(new RKMPolyAABB(RKMMathBox(c, c + RKMMathVector(0.01, 0.01, 0.01))));
+  }
+  for (int i = 0; i < 40; ++i)
+    set.Add(new RKMPolyAABB(RKMMathBox(RKMMathPoint(7, 7, 7), RKMMathPoint(8, 8, 8))));
+  RKMBVHTree *tree;
+  ASSERT_EQ(Build(Builder::Basic, set, tree), S_OK);
+  CheckTree(set, tree->GetRoot(), Builder::Basic, g, 97, 2);
+  int widest = 0, flat40 = 0;
+  for (NodeC n : Walk(tree->GetRoot()).order)
+  {
+    widest = std::max(widest, n->GetNbChildren() == 40 ? 0 : n->GetNbChildren());
+    flat40 += n->GetNbChildren() == 40;
+  }
+  EXPECT_LE(widest, 16);
+  EXPECT_EQ(flat40, 1);
+  EXPECT_EQ(tree->Release(), 0);
+}
+
 TEST(RKMBVHTreeBuilder, FailureLeavesTreeAndLeavesToTheCaller)
 {
   for (Strategy s : kStrategies)
