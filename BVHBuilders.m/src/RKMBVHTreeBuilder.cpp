@@ -139,14 +139,14 @@ HRESULT Flat(Build &build, const std::vector<RKMBVHNodeConst *> &usable, RKMBVHT
   return build.Finish(root, tree);
 }
 
-int Cell(double v, double lower, double scale)
+int Cell(double v, double lower, double scale, int resolution)
 {
   // Clamped into the grid: a centre on the upper limit, or a NaN, still lands in a cell.
   const double x = (v - lower) * scale;
   if (!(x >= 0.0))
     return 0;
-  if (x >= 15.0)
-    return 15;
+  if (x >= resolution - 1)
+    return resolution - 1;
   return static_cast<int>(x);
 }
 
@@ -161,17 +161,31 @@ constexpr int kMaxGridDepth = 3;
 RKMBVHNodeConst *GridTree(Build &build, const std::vector<RKMBVHNodeConst *> &usable, int depth, bool &oom)
 {
   const size_t n = usable.size();
-  constexpr int kCells = 16 * 16 * 16;
+  // The top grid is 16 cells a side. A crowded cell's own grid is as fine as its leaves need, about
+  // two per cell, so that its fixed cost follows their number.
+  int res = 16;
+  if (depth > 0)
+  {
+    res = 2;
+    while (res < 16 && static_cast<size_t>(res) * res * res < n / 2)
+      res *= 2;
+  }
+  const int kCells = res * res * res;
+  // The leaves are ordered by cell with a counting sort, keeping the iteration order within a cell:
+  // a call costs a few arrays, not one list per cell, which matters as crowded cells call again.
   std::vector<RKMMathPoint> centres;
-  // The grid lives on the heap: 4096 cell lists and node slots are too much for a thread's stack.
-  std::vector<std::vector<RKMBVHNodeConst *>> cells;
-  std::vector<RKMBVHNodeConst *> grid, level;
+  std::vector<int> cellOf;
+  std::vector<size_t> start, next;
+  std::vector<RKMBVHNodeConst *> byCell, grid, level;
   try
   {
     centres.reserve(n);
-    cells.resize(kCells);
-    grid.assign(kCells, nullptr);
-    level.reserve(kCells);
+    cellOf.resize(n);
+    start.assign(static_cast<size_t>(kCells) + 1, 0);
+    next.resize(static_cast<size_t>(kCells));
+    byCell.resize(n);
+    grid.assign(static_cast<size_t>(kCells), nullptr);
+    level.reserve(64);
   }
   catch (...)
   {
@@ -195,35 +209,47 @@ RKMBVHNodeConst *GridTree(Build &build, const std::vector<RKMBVHNodeConst *> &us
   {
     lo[a] -= margin;
     hi[a] += margin;
-    scale[a] = 16.0 / (hi[a] - lo[a]);
+    scale[a] = res / (hi[a] - lo[a]);
   }
-  try
+  for (size_t k = 0; k < n; ++k)
   {
-    for (size_t k = 0; k < n; ++k)
-    {
-      const int ix = Cell(centres[k].x, lo[0], scale[0]), iy = Cell(centres[k].y, lo[1], scale[1]),
-                iz = Cell(centres[k].z, lo[2], scale[2]);
-      cells[static_cast<size_t>((ix * 16 + iy) * 16 + iz)].push_back(usable[k]);
-    }
+    const int ix = Cell(centres[k].x, lo[0], scale[0], res), iy = Cell(centres[k].y, lo[1], scale[1], res),
+              iz = Cell(centres[k].z, lo[2], scale[2], res);
+    cellOf[k] = (ix * res + iy) * res + iz;
+    ++start[static_cast<size_t>(cellOf[k]) + 1];
   }
-  catch (...)
-  {
-    oom = true;
-    return nullptr;
-  }
+  for (int c = 0; c < kCells; ++c)
+    start[static_cast<size_t>(c) + 1] += start[static_cast<size_t>(c)];
+  std::copy(start.begin(), start.end() - 1, next.begin());
+  for (size_t k = 0; k < n; ++k)
+    byCell[next[static_cast<size_t>(cellOf[k])]++] = usable[k];
   // Level 0: one node per cell of two or more leaves.
+  std::vector<RKMBVHNodeConst *> cell;
   for (int c = 0; c < kCells; ++c)
   {
-    std::vector<RKMBVHNodeConst *> &cell = cells[static_cast<size_t>(c)];
-    if (cell.size() == 1)
-      grid[static_cast<size_t>(c)] = cell[0];
-    else if (cell.size() > 1)
+    const size_t first = start[static_cast<size_t>(c)], count = start[static_cast<size_t>(c) + 1] - first;
+    if (count == 1)
+      grid[static_cast<size_t>(c)] = byCell[first];
+    else if (count > 1)
     {
       // Only a cell that holds fewer than all the leaves is gridded again, so that coincident
       // centres end in one flat node instead of recursing.
-      RKMBVHNodeConst *node = cell.size() > kMaxCellLeaves && depth < kMaxGridDepth && cell.size() < n
-                                  ? GridTree(build, cell, depth + 1, oom)
-                                  : build.Parent(cell.data(), cell.size());
+      RKMBVHNodeConst *node = nullptr;
+      if (count > kMaxCellLeaves && depth < kMaxGridDepth && count < n)
+      {
+        try
+        {
+          cell.assign(byCell.begin() + static_cast<long>(first), byCell.begin() + static_cast<long>(first + count));
+        }
+        catch (...)
+        {
+          oom = true;
+          return nullptr;
+        }
+        node = GridTree(build, cell, depth + 1, oom);
+      }
+      else
+        node = build.Parent(byCell.data() + first, count);
       if (!node)
       {
         oom = true;
@@ -233,7 +259,7 @@ RKMBVHNodeConst *GridTree(Build &build, const std::vector<RKMBVHNodeConst *> &us
     }
   }
   // Each coarser level gathers 2 × 2 × 2 cells; a single result passes up, never a one-child node.
-  for (int m = 8; m >= 1; m /= 2)
+  for (int m = res / 2; m >= 1; m /= 2)
   {
     const int fine = 2 * m;
     level.clear();

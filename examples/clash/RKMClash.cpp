@@ -227,15 +227,24 @@ public:
   TrianglePairWalk(const Scene &scene, const std::vector<PlacedMesh> &meshes, int a, int b,
                    const RKMMathTransformation *ta, const RKMMathTransformation *tb, ObjectPairReport &out,
                    const std::function<void()> &tick)
-      : m_scene(scene), m_meshes(meshes), m_a(a), m_b(b), m_ta(ta), m_tb(tb), m_intersector(*scene.arithmetic),
-        m_out(out), m_tick(tick)
+      : m_scene(scene), m_meshes(meshes), m_a(a), m_b(b), m_intersector(*scene.arithmetic), m_out(out), m_tick(tick)
   {
+    // The second tree's volumes are placed into the first one's frame, so each test places one
+    // volume instead of both. The motions are rigid: distances, and so the tolerance, carry over.
+    RKMMathTransformation inverse = *ta;
+    m_relativeOk = SUCCEEDED(inverse.ComputeInverse());
+    m_relative = inverse * *tb;
+    m_ta = ta;
+    m_tb = tb;
   }
   long tested = 0;
 
 protected:
   unsigned char Filter(RKMBVHNodeConst &a, RKMBVHNodeConst &b) override
   {
+    if (m_relativeOk)
+      return RKMPolyBVBVOperations::BVOverLapOnePos(a.GetFirstBoundingVolume(), b.GetFirstBoundingVolume(),
+                                                    m_scene.tolerance, &m_relative);
     return RKMPolyBVBVOperations::BVOverLap(a.GetFirstBoundingVolume(), b.GetFirstBoundingVolume(),
                                             m_scene.tolerance, m_ta, m_tb);
   }
@@ -254,7 +263,9 @@ private:
   const Scene &m_scene;
   const std::vector<PlacedMesh> &m_meshes;
   int m_a, m_b;
-  const RKMMathTransformation *m_ta, *m_tb;
+  const RKMMathTransformation *m_ta = nullptr, *m_tb = nullptr;
+  RKMMathTransformation m_relative;
+  bool m_relativeOk = false;
   RKMPolyTriangleIntersector m_intersector;
   ObjectPairReport &m_out;
   const std::function<void()> &m_tick;
@@ -317,9 +328,11 @@ bool FindClashes(const std::vector<PlacedMesh> &meshes, const ClashOptions &opti
     error = "at least two meshes are needed";
     return false;
   }
+  const auto prepareStart = std::chrono::steady_clock::now();
   Scene scene;
   if (!MakeScene(meshes, options.gridded, scene, error))
     return false;
+  report.prepareSeconds = Seconds(prepareStart);
 
   const auto buildStart = std::chrono::steady_clock::now();
   RKMBVHTreeSet set(static_cast<RKMBVHTreeBuilder::SpatialOptimization>(options.strategy),

@@ -68,7 +68,8 @@ struct ClashOptions
 struct ClashReport
 {
   std::vector<ObjectPairReport> pairs;
-  double buildSeconds = 0.0, walkSeconds = 0.0;
+  /// Placing (and snapping) the coordinates, building the hierarchies, walking them.
+  double prepareSeconds = 0.0, buildSeconds = 0.0, walkSeconds = 0.0;
   long objectPairsTested = 0, trianglePairsTested = 0;
 };
 
