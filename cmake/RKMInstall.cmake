@@ -9,7 +9,7 @@ install(TARGETS RKMRezazizuviVaveverodiz
   ARCHIVE DESTINATION ${CMAKE_INSTALL_LIBDIR})
 
 file(GLOB RKM_INSTALLED_HEADERS CONFIGURE_DEPENDS
-  ${PROJECT_SOURCE_DIR}/ProtectedInterfaces/*.h
+  ${PROJECT_SOURCE_DIR}/ProtectedInterfaces/*/*.h
   ${PROJECT_SOURCE_DIR}/SystemInterfaces/*.h)
 install(FILES ${RKM_INSTALLED_HEADERS}
   DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/RKMRezazizuviVaveverodiz)

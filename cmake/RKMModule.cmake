@@ -16,35 +16,33 @@ if(RKM_SANITIZE)
   endif()
 endif()
 
-set(RKM_PUBLIC_INCLUDE_DIRS
-  ${PROJECT_SOURCE_DIR}/ProtectedInterfaces
-  ${PROJECT_SOURCE_DIR}/SystemInterfaces)
-
 set_property(GLOBAL PROPERTY RKM_MODULES "")
+
+# The folder of a module's public headers: the platform layer keeps its own, every other module has
+# one under ProtectedInterfaces/.
+function(rkm_module_header_dir name out)
+  if(name STREQUAL "SystemInterfaces")
+    set(${out} ${PROJECT_SOURCE_DIR}/SystemInterfaces PARENT_SCOPE)
+  else()
+    set(${out} ${PROJECT_SOURCE_DIR}/ProtectedInterfaces/${name} PARENT_SCOPE)
+  endif()
+endfunction()
 
 # rkm_add_module(<name> SOURCES <files...> [DEPENDS <modules...>] [EXACT])
 #
-# Adds the object library RKM_<name>. DEPENDS names the lower modules it may use.
+# Adds the object library RKM_<name>. DEPENDS names the lower modules it may use; the module sees
+# the headers of its own folder and of those modules only, so an include reaching up a layer fails
+# to compile.
 # EXACT compiles it with -ffp-contract=off: a fused multiply-add rounds once where
 # the exact code counts on two roundings, and breaks its error bounds.
 # With RKM_LAYER_CHECK, RKM_<name>_layercheck links the module's objects with those
 # of its declared dependencies only, into a shared object with --no-undefined, so a
-# call into a module above (or beside) it fails the build.
+# call into a module above (or beside) it fails the build; and RKM_<name>_headercheck
+# compiles each of its public headers alone on the module's include path, so a header
+# that needs one of a higher layer, or one it does not include, fails too.
 function(rkm_add_module name)
   cmake_parse_arguments(ARG "EXACT" "" "SOURCES;DEPENDS" ${ARGN})
   set(target RKM_${name})
-  add_library(${target} OBJECT ${ARG_SOURCES})
-  set_target_properties(${target} PROPERTIES
-    CXX_EXTENSIONS OFF
-    CXX_VISIBILITY_PRESET hidden
-    VISIBILITY_INLINES_HIDDEN ON
-    POSITION_INDEPENDENT_CODE ON)
-  target_include_directories(${target} PUBLIC ${RKM_PUBLIC_INCLUDE_DIRS})
-  target_compile_definitions(${target} PRIVATE RKM_BUILDING_LIBRARY)
-  target_link_libraries(${target} PUBLIC rkm_build_flags)
-  if(ARG_EXACT)
-    target_compile_options(${target} PRIVATE -ffp-contract=off)
-  endif()
 
   set(closure ${name})
   foreach(dep IN LISTS ARG_DEPENDS)
@@ -57,6 +55,25 @@ function(rkm_add_module name)
   list(REMOVE_DUPLICATES closure)
   set_property(GLOBAL PROPERTY RKM_CLOSURE_${name} ${closure})
   set_property(GLOBAL APPEND PROPERTY RKM_MODULES ${name})
+  set(include_dirs "")
+  foreach(m IN LISTS closure)
+    rkm_module_header_dir(${m} dir)
+    list(APPEND include_dirs ${dir})
+  endforeach()
+  set_property(GLOBAL APPEND PROPERTY RKM_PUBLIC_INCLUDE_DIRS ${include_dirs})
+
+  add_library(${target} OBJECT ${ARG_SOURCES})
+  set_target_properties(${target} PROPERTIES
+    CXX_EXTENSIONS OFF
+    CXX_VISIBILITY_PRESET hidden
+    VISIBILITY_INLINES_HIDDEN ON
+    POSITION_INDEPENDENT_CODE ON)
+  target_include_directories(${target} PRIVATE ${include_dirs})
+  target_compile_definitions(${target} PRIVATE RKM_BUILDING_LIBRARY)
+  target_link_libraries(${target} PUBLIC rkm_build_flags)
+  if(ARG_EXACT)
+    target_compile_options(${target} PRIVATE -ffp-contract=off)
+  endif()
 
   if(RKM_LAYER_CHECK)
     set(objects "")
@@ -67,6 +84,20 @@ function(rkm_add_module name)
     target_link_libraries(${target}_layercheck PRIVATE rkm_build_flags ${CMAKE_DL_LIBS} Threads::Threads)
     target_link_options(${target}_layercheck PRIVATE -Wl,--no-undefined)
     set_target_properties(${target}_layercheck PROPERTIES LINKER_LANGUAGE CXX)
+
+    rkm_module_header_dir(${name} own_dir)
+    file(GLOB headers CONFIGURE_DEPENDS ${own_dir}/*.h)
+    set(checks "")
+    foreach(header IN LISTS headers)
+      get_filename_component(stem ${header} NAME_WE)
+      set(check ${CMAKE_CURRENT_BINARY_DIR}/headercheck/${stem}.cpp)
+      file(CONFIGURE OUTPUT ${check} CONTENT "#include \"${stem}.h\"\n")
+      list(APPEND checks ${check})
+    endforeach()
+    add_library(${target}_headercheck OBJECT ${checks})
+    target_include_directories(${target}_headercheck PRIVATE ${include_dirs})
+    target_compile_definitions(${target}_headercheck PRIVATE RKM_BUILDING_LIBRARY)
+    target_link_libraries(${target}_headercheck PRIVATE rkm_build_flags)
   endif()
 endfunction()
 
@@ -85,8 +116,10 @@ function(rkm_add_shared_library)
     VERSION ${PROJECT_VERSION}
     SOVERSION ${PROJECT_VERSION_MAJOR})
   target_compile_features(RKMRezazizuviVaveverodiz PUBLIC cxx_std_17)
+  get_property(include_dirs GLOBAL PROPERTY RKM_PUBLIC_INCLUDE_DIRS)
+  list(REMOVE_DUPLICATES include_dirs)
   target_include_directories(RKMRezazizuviVaveverodiz PUBLIC
-    "$<BUILD_INTERFACE:${RKM_PUBLIC_INCLUDE_DIRS}>"
+    "$<BUILD_INTERFACE:${include_dirs}>"
     "$<INSTALL_INTERFACE:${CMAKE_INSTALL_INCLUDEDIR}/RKMRezazizuviVaveverodiz>")
   target_link_libraries(RKMRezazizuviVaveverodiz PRIVATE $<BUILD_INTERFACE:rkm_build_flags> ${CMAKE_DL_LIBS} Threads::Threads)
   target_link_options(RKMRezazizuviVaveverodiz PRIVATE -Wl,--no-undefined)

@@ -26,6 +26,14 @@ public:
   int GetDepth1() const { return depth1; }
   int GetDepth2() const { return depth2; }
 
+  /// Choose's answers; any other value opens both sides, as ChooseBoth does.
+  enum ChooseSide : int
+  {
+    ChooseBoth = 0,
+    ChooseFirst = 1,
+    ChooseSecond = 2
+  };
+
 protected:
   /// Keeps the pair (true) or prunes it.
   virtual unsigned char Filter(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
@@ -34,7 +42,7 @@ protected:
   /// True ends the walk at the next point where it is asked.
   virtual unsigned char IsStopped();
   virtual HRESULT ProcessLeafNodes(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
-  /// 1 opens only a's children, 2 only b's, anything else both.
+  /// ChooseFirst opens only a's children, ChooseSecond only b's, anything else both.
   virtual int Choose(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
   /// Called after a pair that passed Filter has been handled.
   virtual void End(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
