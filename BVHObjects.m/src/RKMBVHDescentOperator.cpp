@@ -9,7 +9,7 @@ unsigned char RKMBVHDescentOperator::Filter(RKMBVHNodeConst &) { return 1; }
 HRESULT RKMBVHDescentOperator::ProcessLeafNode(RKMBVHNodeConst &) { return S_OK; }
 unsigned char RKMBVHDescentOperator::IsStopped() { return 0; }
 HRESULT RKMBVHDescentOperator::ProcessLeafNodes(RKMBVHNodeConst &, RKMBVHNodeConst &) { return S_OK; }
-int RKMBVHDescentOperator::Choose(RKMBVHNodeConst &, RKMBVHNodeConst &) { return 0; }
+int RKMBVHDescentOperator::Choose(RKMBVHNodeConst &, RKMBVHNodeConst &) { return ChooseBoth; }
 void RKMBVHDescentOperator::End(RKMBVHNodeConst &, RKMBVHNodeConst &) {}
 
 HRESULT RKMBVHDescentOperator::Descend(RKMBVHTree &tree)
@@ -101,9 +101,9 @@ HRESULT RKMBVHDescentOperator::Descend(RKMBVHNodeConst &a, RKMBVHNodeConst &b)
     openB();
   else if (nb == 0)
     openA();
-  else if (choice == 2)
+  else if (choice == ChooseSecond)
     openB();
-  else if (choice == 1)
+  else if (choice == ChooseFirst)
     openA();
   else
   {

@@ -1,15 +1,10 @@
-#include "RKMBVHDescentOperator.h"
 #include "RKMBVHNode.h"
-#include "RKMBVHPickingCallback.h"
-#include "RKMBVHPickingOperator.h"
 #include "RKMBVHTree.h"
 #include "RKMBVHTreeObserver.h"
 #include "RKMPolyDebugStackTrace.h"
 #include "RKMPolyScopedMutex.h"
 
 #include <vector>
-
-RKMBVHTreeObserver::~RKMBVHTreeObserver() = default;
 
 RKMBVHTree::RKMBVHTree(RKMBVHNode *root) : m_root(nullptr)
 {
@@ -77,7 +72,3 @@ void RKMBVHTree::FlushMemory()
 }
 
 HRESULT RKMBVHTree::Absorb(RKMBVHTree &) { return E_NOTIMPL; }
-
-RKMBVHPickingCallback::~RKMBVHPickingCallback() = default;
-
-HRESULT RKMBVHPickingOperator::Run(const RKMBVHTree &, const RKMMathPoint &, const RKMMathVector &) { return E_FAIL; }

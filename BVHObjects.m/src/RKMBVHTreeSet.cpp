@@ -7,7 +7,8 @@
 #include "RKMPolyBVClone.h"
 #include "RKMPolyBVOperations.h"
 #include "RKMPolyDebugStackTrace.h"
-#include "RKMPolyPool.h"
+#include "RKMPolyScopedMutex.h"
+#include "RKMRef.h"
 #include "RKMSetOfInt.h"
 
 #include "RKMMathTransformation.h"
@@ -16,44 +17,10 @@
 
 #include <mutex>
 #include <new>
+#include <optional>
 #include <vector>
 
 const RKMMathTransformation RKMBVHTreeSet::_Identity;
-
-RKMBVHTreeSetObserver::~RKMBVHTreeSetObserver() = default;
-
-RKMBVHTreeSetAttribute::~RKMBVHTreeSetAttribute()
-{
-  if (tree)
-    tree->Release();
-  tree = nullptr;
-}
-
-void *RKMBVHTreeSetAttribute::operator new(std::size_t size) noexcept
-{
-  return size > 0xFFFFFFFFu ? nullptr : RKMPolyPool::AllocateObjectInTSPool(static_cast<unsigned>(size));
-}
-
-void RKMBVHTreeSetAttribute::operator delete(void *p) noexcept { RKMPolyPool::FreeObjectFromPool(p); }
-
-RKMBVHNodeIterator &RKMBVHNodeListIterator::Begin()
-{
-  m_position = 1;
-  return *this;
-}
-
-unsigned char RKMBVHNodeListIterator::End() const { return m_position < 1 || m_position > m_count; }
-
-RKMBVHNodeIterator &RKMBVHNodeListIterator::operator++()
-{
-  ++m_position;
-  return *this;
-}
-
-RKMBVHNode *RKMBVHNodeListIterator::operator*() const
-{
-  return End() ? nullptr : static_cast<RKMBVHNode *>(m_list[m_position]);
-}
 
 namespace
 {
@@ -131,11 +98,13 @@ template <class Call>
 void RKMBVHTreeSet::Notify(Call call)
 {
   std::vector<RKMBVHTreeSetObserver *> observers;
-  if (m_mutex)
-    (m_mutex->*RKMMutex::LockF)();
-  RKMPolyObserver<RKMBVHTreeSetObserver>::Snapshot(m_observers, observers);
-  if (m_mutex)
-    (m_mutex->*RKMMutex::UnlockF)();
+  {
+    // Without its mutex (it could not be allocated) the set takes its observers unlocked.
+    std::optional<RKMPolyScopedMutex> lock;
+    if (m_mutex)
+      lock.emplace(*m_mutex);
+    RKMPolyObserver<RKMBVHTreeSetObserver>::Snapshot(m_observers, observers);
+  }
   for (RKMBVHTreeSetObserver *o : observers)
     call(*o);
   RKMPolyObserver<RKMBVHTreeSetObserver>::ReleaseSnapshot(observers);
@@ -199,14 +168,15 @@ HRESULT RKMBVHTreeSet::ProtectedAddTree(int id, RKMBVHTree *tree, const RKMMathT
   RKMBVHTreeSetAttribute *attribute = new RKMBVHTreeSetAttribute;
   if (!attribute)
     return E_OUTOFMEMORY;
-  tree->AddRef();
-  attribute->tree = tree;
+  // The leaf's reference: the attribute holds it only once the leaf is complete, and a failure
+  // releases it.
+  RKMRef<RKMBVHTree> reference = RKMRef<RKMBVHTree>::Share(tree);
   attribute->objectId = id;
   attribute->position = placed ? P : _Identity;
   RKMPolyBoundingVolume *first = ApplySmartTransformation(root->GetFirstBoundingVolume(), placed ? &P : nullptr);
   RKMPolyBoundingVolume *second = ApplySmartTransformation(root->GetSecondBoundingVolume(), placed ? &P : nullptr);
   RKMBVHNode *leaf = new RKMBVHNode(first);
-  // Whatever could not be made is undone, the attribute's reference on the tree included.
+  // Whatever could not be made is undone.
   if (!leaf || (root->GetFirstBoundingVolume() && !first) || (root->GetSecondBoundingVolume() && !second) ||
       !m_leaves.Append(leaf))
   {
@@ -218,6 +188,7 @@ HRESULT RKMBVHTreeSet::ProtectedAddTree(int id, RKMBVHTree *tree, const RKMMathT
     delete attribute;
     return E_OUTOFMEMORY;
   }
+  attribute->tree = reference.Detach();
   leaf->SetSecondBoundingVolume(second);
   leaf->SetAttribute(attribute);
   OverAllTreeNeedsUpdate();
@@ -377,14 +348,14 @@ void RKMBVHTreeSet::RecursivelyDestroyIntermediateNodes(RKMBVHNode *node)
 
 void RKMBVHTreeSet::OverAllTreeNeedsUpdate()
 {
-  RKMBVHTree *tree = LoadTree(&m_overAllTree);
+  // The set's reference, released once the tree no longer holds the leaves.
+  const RKMRef<RKMBVHTree> tree = RKMRef<RKMBVHTree>::Adopt(LoadTree(&m_overAllTree));
   if (!tree)
     return;
   StoreTree(&m_overAllTree, nullptr);
   RKMBVHNode *root = static_cast<RKMBVHNode *>(tree->GetRoot());
   RecursivelyDestroyIntermediateNodes(root);
   tree->UnregisterRootNode();
-  tree->Release();
 }
 
 void RKMBVHTreeSet::RebuildOverAllTree()
@@ -417,7 +388,7 @@ RKMBVHTree *RKMBVHTreeSet::GetTree()
   }
   if (!m_mutex)
     return nullptr;
-  (m_mutex->*RKMMutex::LockF)();
+  RKMPolyScopedMutex lock(*m_mutex);
   RKMBVHTree *tree = LoadTree(&m_overAllTree);
   if (!tree)
   {
@@ -426,7 +397,6 @@ RKMBVHTree *RKMBVHTreeSet::GetTree()
   }
   if (tree)
     tree->AddRef();
-  (m_mutex->*RKMMutex::UnlockF)();
   return tree;
 }
 
@@ -466,16 +436,14 @@ void RKMBVHTreeSet::RegisterObserver(RKMBVHTreeSetObserver *observer)
 {
   if (!m_mutex)
     return;
-  (m_mutex->*RKMMutex::LockF)();
+  RKMPolyScopedMutex lock(*m_mutex);
   RKMPolyObserver<RKMBVHTreeSetObserver>::Register(m_observers, observer);
-  (m_mutex->*RKMMutex::UnlockF)();
 }
 
 void RKMBVHTreeSet::UnregisterObserver(RKMBVHTreeSetObserver *observer)
 {
   if (!m_mutex)
     return;
-  (m_mutex->*RKMMutex::LockF)();
+  RKMPolyScopedMutex lock(*m_mutex);
   RKMPolyObserver<RKMBVHTreeSetObserver>::Unregister(m_observers, observer);
-  (m_mutex->*RKMMutex::UnlockF)();
 }

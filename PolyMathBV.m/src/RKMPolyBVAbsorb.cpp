@@ -1,3 +1,5 @@
+// The absorbing half of RKMPolyBVBVOperations (Absorb, GetVolumeOfUnion), apart from its overlap and
+// distance tests in RKMPolyBVBVOperations.cpp.
 #include "RKMPolyAABB.h"
 #include "RKMPolyBVBVOperations.h"
 #include "RKMPolyBVOperations.h"

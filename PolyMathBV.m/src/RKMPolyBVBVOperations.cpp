@@ -5,6 +5,7 @@
 #include "RKMPolyBoundingCylinder.h"
 #include "RKMPolyBoundingPlane.h"
 #include "RKMPolyBoundingSphere.h"
+#include "RKMPolyLineBoxDistance.h"
 #include "RKMPolyOBB.h"
 
 #include "RKMMathBox.h"
@@ -154,64 +155,6 @@ Placed Place(const BV &bv, const RKMMathTransformation *T, double tolerance)
 
 double Norm1(const RKMMathVector &v) { return std::fabs(v.x) + std::fabs(v.y) + std::fabs(v.z); }
 
-// Squared distance from the line or segment c + s·a (|s| ≤ L, or any s when L ≤ 0) to the box [−h, h]
-// in the box's own frame. The squared distance of c + s·a to the box is convex and piecewise quadratic
-// in s with breaks where a coordinate crosses a face; its minimum is at a break, at an end of the
-// segment, or at the vertex of a piece, and all of them are tried.
-double LineBoxSquare(const RKMMathPoint &c, const RKMMathVector &a, double L, const RKMMathVector &h)
-{
-  const bool infinite = !(L > 0.0);
-  auto at = [&](double s) {
-    double sum = 0.0;
-    for (int i = 0; i < 3; ++i)
-    {
-      const double e = std::fabs(c[i] + s * a[i]) - h[i];
-      if (e > 0.0)
-        sum += e * e;
-    }
-    return sum;
-  };
-  auto clamp = [&](double s) { return infinite ? s : std::fmax(-L, std::fmin(L, s)); };
-  double breaks[16];
-  int n = 0;
-  for (int i = 0; i < 3; ++i)
-    if (a[i] != 0.0)
-    {
-      breaks[n++] = clamp((h[i] - c[i]) / a[i]);
-      breaks[n++] = clamp((-h[i] - c[i]) / a[i]);
-    }
-  if (!infinite)
-  {
-    breaks[n++] = -L;
-    breaks[n++] = L;
-  }
-  std::sort(breaks, breaks + n);
-  double best = at(n ? breaks[0] : 0.0);
-  for (int k = 0; k < n; ++k)
-    best = std::fmin(best, at(breaks[k]));
-  for (int k = 0; k <= n; ++k)
-  {
-    if (!infinite && (k == 0 || k == n))
-      continue;
-    const double left = k == 0 ? (n ? breaks[0] - 1.0 : -1.0) : breaks[k - 1];
-    const double right = k == n ? (n ? breaks[n - 1] + 1.0 : 1.0) : breaks[k];
-    const double mid = 0.5 * (left + right);
-    double num = 0.0, den = 0.0;
-    for (int i = 0; i < 3; ++i)
-    {
-      const double x = c[i] + mid * a[i];
-      if (std::fabs(x) > h[i])
-      {
-        num += a[i] * ((x > 0.0 ? h[i] : -h[i]) - c[i]);
-        den += a[i] * a[i];
-      }
-    }
-    if (den > 0.0)
-      best = std::fmin(best, at(clamp(num / den)));
-  }
-  return best;
-}
-
 // Squared distance between two segments or lines (half-length ≤ 0: a whole line). Convex in (s, u),
 // so the minimum is the interior critical point when it is inside the domain, or lies on an edge where
 // one parameter is at its bound and the other takes its clamped optimum. Each candidate is measured
@@ -336,7 +279,8 @@ double MinDistance(const Placed &x, const Placed &y)
       const RKMMathOBBBase &b = y.box;
       const RKMMathPoint c = b.XYZtoUVW(x.c);
       const RKMMathVector a(x.a * b.U(), x.a * b.V(), x.a * b.W());
-      d2 = LineBoxSquare(c, a, x.L, b.Diagonal());
+      double where;
+      d2 = RKMPolyLineBoxDistance::LineSquare(c, a, x.L, b.Diagonal(), where);
     }
     const double scale = Norm1(x.c.AsVector()) + (x.L > 0.0 ? x.L : 0.0) + x.r + others;
     return std::fmax(0.0, std::sqrt(d2) - x.r - others - kSlack * scale);

@@ -1,4 +1,9 @@
+// RKMPolyOBB's directional distances: how far one volume travels along a direction before it meets
+// another. They stand apart from the box's other members for their length.
+
 #include "RKMPolyOBB.h"
+
+#include "RKMPolyLineBoxDistance.h"
 
 #include <algorithm>
 #include <cfloat>
@@ -56,18 +61,6 @@ double SmallestSquare(double lo, double hi)
   return t * t;
 }
 
-// Squared distance from the point p + τ·q (local coordinates) to the box [−h, h].
-double Excess(const RKMMathPoint &p, const RKMMathVector &q, const RKMMathVector &h, double tau)
-{
-  double s = 0.0;
-  for (int i = 0; i < 3; ++i)
-  {
-    const double e = std::fabs(p[i] + tau * q[i]) - h[i];
-    if (e > 0.0)
-      s += e * e;
-  }
-  return s;
-}
 }
 
 unsigned char RKMPolyOBB::SquareDistanceMinDir(const RKMPolyOBB &other, const RKMMathVector &direction,
@@ -107,49 +100,8 @@ unsigned char RKMPolyOBB::SquareDistanceMinDir(const RKMMathPoint &center, doubl
   const RKMMathPoint p = m_base.XYZtoUVW(center);
   const RKMMathVector q(d * m_base.U(), d * m_base.V(), d * m_base.W());
   const RKMMathVector &h = m_base.Diagonal();
-  double candidates[16];
-  int n = 0;
-  for (int i = 0; i < 3; ++i)
-    if (q[i] != 0.0)
-    {
-      candidates[n++] = (h[i] - p[i]) / q[i];
-      candidates[n++] = (-h[i] - p[i]) / q[i];
-    }
-  std::sort(candidates, candidates + n);
-  double best = 0.0, bestValue = Excess(p, q, h, 0.0);
-  auto consider = [&](double tau) {
-    if (!std::isfinite(tau))
-      return;
-    const double v = Excess(p, q, h, tau);
-    if (v < bestValue)
-    {
-      bestValue = v;
-      best = tau;
-    }
-  };
-  for (int k = 0; k < n; ++k)
-    consider(candidates[k]);
-  // Vertex of each piece: between consecutive breaks (and beyond the outer ones) the active axes are
-  // fixed; the piece's quadratic has its minimum at Σ q_i (b_i − p_i) / Σ q_i² over them.
-  for (int k = 0; k <= n; ++k)
-  {
-    const double left = k == 0 ? (n ? candidates[0] - 1.0 : -1.0) : candidates[k - 1];
-    const double right = k == n ? (n ? candidates[n - 1] + 1.0 : 1.0) : candidates[k];
-    const double mid = 0.5 * (left + right);
-    double num = 0.0, den = 0.0;
-    for (int i = 0; i < 3; ++i)
-    {
-      const double x = p[i] + mid * q[i];
-      if (std::fabs(x) > h[i])
-      {
-        const double bound = x > 0.0 ? h[i] : -h[i];
-        num += q[i] * (bound - p[i]);
-        den += q[i] * q[i];
-      }
-    }
-    if (den > 0.0)
-      consider(num / den);
-  }
+  double best;
+  const double bestValue = RKMPolyLineBoxDistance::LineSquare(p, q, 0.0, h, best);
   if (bestValue > r2 * (1.0 + 1e-12))
     return 0;
   // g(0) > r² ≥ g(best): bisect for the contact between them; the outer end of the bracket is kept,
@@ -160,7 +112,7 @@ unsigned char RKMPolyOBB::SquareDistanceMinDir(const RKMMathPoint &center, doubl
     const double mid = 0.5 * (outside + inside);
     if (mid == outside || mid == inside)
       break;
-    if (Excess(p, q, h, mid) <= r2)
+    if (RKMPolyLineBoxDistance::PointSquare(p, q, h, mid) <= r2)
       inside = mid;
     else
       outside = mid;

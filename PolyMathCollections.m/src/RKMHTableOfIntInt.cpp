@@ -1,3 +1,5 @@
+// RKMHTableOfIntInt and RKMHTableOfIntIntIterator, the walk over its pairs that reads its table: both
+// are declared in RKMHTableOfIntInt.h.
 #include "RKMHTableOfIntInt.h"
 
 #include <new>

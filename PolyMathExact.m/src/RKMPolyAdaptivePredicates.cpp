@@ -1,3 +1,6 @@
+// The adaptive kernel (expansion arithmetic and its three predicates), and the members of
+// RKMPolyExactArithmetic that call it, kept beside it so that its filters inline into them.
+
 #include "RKMPolyAdaptivePredicates.h"
 
 #include <cmath>
@@ -576,8 +579,6 @@ double RKMPolyAdaptivePredicates::incircleadapt(const double *pa, const double *
   const int ltot = ExpansionSum(l01, sum01, tlen[2], terms[2], total);
   return total[ltot - 1];
 }
-
-// The adaptive members of the arithmetic live beside the kernel so that its filters inline into them.
 
 int RKMPolyExactArithmetic::AdaptiveOrientation2D(const double *a, const double *b, const double *c) const
 {

@@ -174,18 +174,11 @@ int RKMPolyExactArithmetic::GriddedOrientation2D(const double *a, const double *
 int RKMPolyExactArithmetic::GriddedOrientation3D(const double *a, const double *b, const double *c,
                                                  const double *d) const
 {
-  const double Bx = b[0] - a[0], By = b[1] - a[1], Bz = b[2] - a[2];
-  const double Cx = c[0] - a[0], Cy = c[1] - a[1], Cz = c[2] - a[2];
-  const double Dx = d[0] - a[0], Dy = d[1] - a[1], Dz = d[2] - a[2];
-  const double m1 = Dz * Cy - Dy * Cz;
-  const double m2 = Dz * By - Dy * Bz;
-  const double m3 = Cz * By - Cy * Bz;
-  const double t1 = m1 * Bx, t2 = m2 * Cx, t3 = m3 * Dx;
+  // The static filter of the inline test has already failed; the minors are recomputed here, where
+  // the module's own flags fix the roundings the dynamic bound counts.
+  const Minors3D m(a, b, c, d);
+  const double t1 = m.m1 * m.Bx, t2 = m.m2 * m.Cx, t3 = m.m3 * m.Dx;
   const double det = (t1 - t2) + t3;
-  if (det > m_staticFilter3)
-    return 1;
-  if (det < -m_staticFilter3)
-    return -1;
   // Dynamic filter: three roundings of relative size 2^-53 each bound the error of det. Below the
   // floor every term is an exact multiple of the grid's cube far under 2^53 of them, so det itself
   // is exact and its sign final.
@@ -198,26 +191,20 @@ int RKMPolyExactArithmetic::GriddedOrientation3D(const double *a, const double *
     return -1;
   if (bound == 0.0)
     return 0;
-  return ExactOrientation3D(a, b, c, d);
+  return ExactOrientation3D(m);
 }
 
-int RKMPolyExactArithmetic::ExactOrientation3D(const double *a, const double *b, const double *c,
-                                               const double *d) const
+int RKMPolyExactArithmetic::ExactOrientation3D(const Minors3D &m) const
 {
-  // Differences of grid coordinates take 24 bits and the minors 49; splitting a minor at 2^24 grid
-  // units squared leaves two parts whose products with a difference are exact, and whose group sums
-  // are exact too. Only the final addition rounds, which keeps the sign.
-  const double Bx = b[0] - a[0], By = b[1] - a[1], Bz = b[2] - a[2];
-  const double Cx = c[0] - a[0], Cy = c[1] - a[1], Cz = c[2] - a[2];
-  const double Dx = d[0] - a[0], Dy = d[1] - a[1], Dz = d[2] - a[2];
-  const double m1 = Dz * Cy - Dy * Cz;
-  const double m2 = Dz * By - Dy * Bz;
-  const double m3 = Cz * By - Cy * Bz;
+  // Splitting a minor at 2^24 grid units squared leaves two parts whose products with a difference
+  // are exact, and whose group sums are exact too. Only the final addition rounds, which keeps the
+  // sign.
   double high1, low1, high2, low2, high3, low3;
-  Split(m1, high1, low1, m_splitConstant);
-  Split(m2, high2, low2, m_splitConstant);
-  Split(m3, high3, low3, m_splitConstant);
-  const double r = (low1 * Bx - low2 * Cx + low3 * Dx) + (high1 * Bx - high2 * Cx + high3 * Dx);
+  Split(m.m1, high1, low1, m_splitConstant);
+  Split(m.m2, high2, low2, m_splitConstant);
+  Split(m.m3, high3, low3, m_splitConstant);
+  const double r =
+      (low1 * m.Bx - low2 * m.Cx + low3 * m.Dx) + (high1 * m.Bx - high2 * m.Cx + high3 * m.Dx);
   return r > 0.0 ? 1 : (r < 0.0 ? -1 : 0);
 }
 

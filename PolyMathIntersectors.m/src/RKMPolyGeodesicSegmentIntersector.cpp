@@ -68,7 +68,7 @@ void RKMPolyGeodesicSegmentIntersector::ApplyFeatures(const RKMPolyIntersectionP
 int RKMPolyGeodesicSegmentIntersector::Intersect(const RKMMathPoint &a, const RKMMathPoint &b, const RKMMathPoint &c,
                                                  const RKMMathPoint &d)
 {
-  m_result = -1;
+  m_result = RKMPolyIntersection::ResultUndetermined;
   m_type[0] = m_type[1] = 0;
   m_vertex[0] = m_vertex[1] = 0;
   m_colinear = 0;
@@ -78,33 +78,35 @@ int RKMPolyGeodesicSegmentIntersector::Intersect(const RKMMathPoint &a, const RK
   m_colinear = AreTrianglesCoplanar();
   switch (r)
   {
-  case -6:
+  case RKMPolyIntersection::ResultDegenerateTriangle:
   {
     const RKMPolyExactPredicates predicates(*m_arithmetic);
     if (predicates.AreColinear(*m_apex, a, b))
-      m_result = Between(*m_apex, a, b) ? -8 : -5;
+      m_result = Between(*m_apex, a, b) ? RKMPolyIntersection::ResultApexBetween
+                                        : RKMPolyIntersection::ResultPointSegment;
     else if (predicates.AreColinear(*m_apex, c, d))
-      m_result = Between(*m_apex, c, d) ? -8 : -5;
+      m_result = Between(*m_apex, c, d) ? RKMPolyIntersection::ResultApexBetween
+                                        : RKMPolyIntersection::ResultPointSegment;
     break;
   }
   case -4:
-  case 0:
-    m_result = -2;
+  case RKMPolyIntersection::ResultDisjoint:
+    m_result = RKMPolyIntersection::ResultInadmissible;
     break;
-  case 1:
-    m_result = 0;
+  case RKMPolyIntersection::ResultOnePoint:
+    m_result = RKMPolyIntersection::ResultDisjoint;
     break;
-  case 2:
+  case RKMPolyIntersection::ResultTwoPoints:
   {
-    m_result = 1;
+    m_result = RKMPolyIntersection::ResultOnePoint;
     int n = 0;
     const RKMPolyIntersectionPoint *pts = GetIntersectionPoints(n);
     for (int k = 0; k < n && pts; ++k)
       ApplyFeatures(pts[k]);
     break;
   }
-  case 3:
-    m_result = 2;
+  case RKMPolyIntersection::ResultPolygon:
+    m_result = RKMPolyIntersection::ResultTwoPoints;
     break;
   default:
     break;

@@ -168,10 +168,10 @@ int RKMPolyTriangleIntersector::Coplanar(const RKMMathPoint *T1, const RKMMathPo
   m_count = -1;
   m_planarAnswer = false;
   if (!m_intersector2D)
-    return -1;
+    return RKMPolyIntersection::ResultUndetermined;
   const int code = RKMPolyExactTriangleDirection(*m_arithmetic, T1[0], T1[1], T1[2]);
   if (code == 0)
-    return -6;
+    return RKMPolyIntersection::ResultDegenerateTriangle;
   m_planarAnswer = true;
   RKMMathPoint2D p1[3], p2[3];
   for (int k = 0; k < 3; ++k)
@@ -187,23 +187,23 @@ int RKMPolyTriangleIntersector::Intersect(const RKMMathPoint *T1, const RKMMathP
   m_count = 0;
   m_points[0] = m_points[1] = Pt();
   if (!m_arithmetic || !T1 || !T2)
-    return -1;
+    return RKMPolyIntersection::ResultUndetermined;
   const RKMPolyExactArithmetic &ar = *m_arithmetic;
   int sigma1[3], sigma2[3];
   for (int k = 0; k < 3; ++k)
     sigma1[k] = ar.Orientation3D(T2[0], T2[1], T2[2], T1[k]);
   const int sum1 = sigma1[0] + sigma1[1] + sigma1[2];
   if (sum1 == 3 || sum1 == -3)
-    return 0;
+    return RKMPolyIntersection::ResultDisjoint;
   if (sigma1[0] == 0 && sigma1[1] == 0 && sigma1[2] == 0)
     return Coplanar(T1, T2);
   for (int k = 0; k < 3; ++k)
     sigma2[k] = ar.Orientation3D(T1[0], T1[1], T1[2], T2[k]);
   const int sum2 = sigma2[0] + sigma2[1] + sigma2[2];
   if (sum2 == 3 || sum2 == -3)
-    return 0;
+    return RKMPolyIntersection::ResultDisjoint;
   if (sigma2[0] == 0 && sigma2[1] == 0 && sigma2[2] == 0)
-    return -6;
+    return RKMPolyIntersection::ResultDegenerateTriangle;
   return Classify(T1, T2, sigma1, sigma2, false);
 }
 
@@ -213,7 +213,7 @@ int RKMPolyTriangleIntersector::Intersect(const RKMMathPoint &s, const RKMMathPo
   m_count = 0;
   m_points[0] = m_points[1] = Pt();
   if (!m_arithmetic)
-    return -1;
+    return RKMPolyIntersection::ResultUndetermined;
   const RKMPolyExactArithmetic &ar = *m_arithmetic;
   const RKMMathPoint T1[3] = {s, b1, c1}, T2[3] = {s, b2, c2};
   const int sigma1[3] = {0, ar.Orientation3D(s, b2, c2, b1), ar.Orientation3D(s, b2, c2, c1)};
@@ -221,7 +221,7 @@ int RKMPolyTriangleIntersector::Intersect(const RKMMathPoint &s, const RKMMathPo
     return Coplanar(T1, T2);
   const int sigma2[3] = {0, ar.Orientation3D(s, b1, c1, b2), ar.Orientation3D(s, b1, c1, c2)};
   if (sigma2[1] == 0 && sigma2[2] == 0)
-    return -6;
+    return RKMPolyIntersection::ResultDegenerateTriangle;
   return Classify(T1, T2, sigma1, sigma2, true);
 }
 
@@ -253,7 +253,7 @@ int RKMPolyTriangleIntersector::Classify(const RKMMathPoint *T1, const RKMMathPo
   const RKMMathPoint &p1 = *v1[0], &q1 = *v1[1], &r1 = *v1[2];
   const RKMMathPoint &p2 = *v2[0], &q2 = *v2[1], &r2 = *v2[2];
 
-  const int apart = sharedApex ? -2 : 0;
+  const int apart = sharedApex ? RKMPolyIntersection::ResultInadmissible : RKMPolyIntersection::ResultDisjoint;
   const int o1 = ar.Orientation3D(p1, q1, p2, q2);
   if (o1 > 0)
     return apart;
@@ -274,7 +274,7 @@ int RKMPolyTriangleIntersector::Classify(const RKMMathPoint *T1, const RKMMathPo
   if (o3 < 0)
   {
     if (o2 == 0 || alpha == 0)
-      return -2;
+      return RKMPolyIntersection::ResultInadmissible;
     if (o4 < 0 && beta != 0 && o1 != 0)
     {
       add(I, B0);
@@ -297,12 +297,12 @@ int RKMPolyTriangleIntersector::Classify(const RKMMathPoint *T1, const RKMMathPo
       add(I, B2);
     }
     else
-      return -2;
+      return RKMPolyIntersection::ResultInadmissible;
   }
   else if (o3 > 0)
   {
     if (o1 == 0 || beta == 0)
-      return -2;
+      return RKMPolyIntersection::ResultInadmissible;
     if (o4 < 0 && o2 != 0 && alpha == 0)
       add(V0, I);
     else if (o4 < 0 && o2 != 0 && alpha != 0)
@@ -325,7 +325,7 @@ int RKMPolyTriangleIntersector::Classify(const RKMMathPoint *T1, const RKMMathPo
       add(I, B2);
     }
     else
-      return -2;
+      return RKMPolyIntersection::ResultInadmissible;
   }
   else
   {
@@ -351,7 +351,7 @@ int RKMPolyTriangleIntersector::Classify(const RKMMathPoint *T1, const RKMMathPo
     else if (o4 == 0 && o1 == 0 && o2 == 0 && alpha == 0 && beta == 0)
       add(V0, V0);
     else
-      return -2;
+      return RKMPolyIntersection::ResultInadmissible;
   }
 
   VerticesOnPlane(pts, n, 0, g1[1], g1[2]);

@@ -259,12 +259,12 @@ int RKMPolyTriangleIntersector2D::Intersect(const RKMMathPoint2D *t1, const RKMM
   m_count = 0;
   m_orientation[0] = m_orientation[1] = 0;
   if (!t1 || !t2)
-    return -6;
+    return RKMPolyIntersection::ResultDegenerateTriangle;
   const RKMPolyExactArithmetic &ar = *m_arithmetic;
   m_orientation[0] = ar.Orientation2D(t1[0], t1[1], t1[2]);
   m_orientation[1] = ar.Orientation2D(t2[0], t2[1], t2[2]);
   if (m_orientation[0] == 0 || m_orientation[1] == 0)
-    return -6;
+    return RKMPolyIntersection::ResultDegenerateTriangle;
 
   // Both triangles counter-clockwise: a clockwise a, b, c is used as a, c, b.
   const RKMMathPoint2D *T[2][3];
@@ -365,5 +365,8 @@ int RKMPolyTriangleIntersector2D::Intersect(const RKMMathPoint2D *t1, const RKMM
   for (int k = 0; k < n; ++k)
     m_points[k] = pts[reverse ? n - 1 - k : k];
   m_count = n;
-  return n >= 3 ? 3 : n;
+  // Up to two corners the answer is their count; more make a polygon.
+  if (n >= 3)
+    return RKMPolyIntersection::ResultPolygon;
+  return n;
 }

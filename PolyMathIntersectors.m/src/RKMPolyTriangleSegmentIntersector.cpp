@@ -70,20 +70,20 @@ int RKMPolyTriangleSegmentIntersector::Intersect(const RKMMathPoint &a, const RK
   m_planarAnswer = false;
   m_point = RKMPolyIntersectionPoint();
   if (!m_arithmetic)
-    return -1;
+    return RKMPolyIntersection::ResultUndetermined;
   const RKMPolyExactArithmetic &ar = *m_arithmetic;
   const int sp = ar.Orientation3D(a, b, c, p), sq = ar.Orientation3D(a, b, c, q);
   if (sp * sq > 0)
-    return 0;
+    return RKMPolyIntersection::ResultDisjoint;
   if (sp == 0 && sq == 0)
   {
     m_count = -1;
     if (!m_intersector2D)
-      return -1;
+      return RKMPolyIntersection::ResultUndetermined;
     // A degenerate triangle has no plane to project along; the projection would be undefined.
     const int code = RKMPolyExactTriangleDirection(ar, a, b, c);
     if (code == 0)
-      return -6;
+      return RKMPolyIntersection::ResultDegenerateTriangle;
     m_planarAnswer = true;
     RKMMathPoint2D a2, b2, c2, p2, q2;
     RKMPolyProjectOntoCartesianPlane(code, a, a2);
@@ -98,7 +98,7 @@ int RKMPolyTriangleSegmentIntersector::Intersect(const RKMMathPoint &a, const RK
   const int e2 = ar.Orientation3D(b, c, low, high);
   const int e3 = ar.Orientation3D(c, a, low, high);
   if (e1 < 0 || e2 < 0 || e3 < 0)
-    return 0;
+    return RKMPolyIntersection::ResultDisjoint;
   const int zeros = (e1 == 0) + (e2 == 0) + (e3 == 0);
   if (zeros == 0)
     m_point.SetTriangleIntersection(0);
@@ -111,7 +111,7 @@ int RKMPolyTriangleSegmentIntersector::Intersect(const RKMMathPoint &a, const RK
   else if (e3 == 0 && e1 == 0)
     m_point.SetVertexIntersection(0, 0);
   else
-    return -6;
+    return RKMPolyIntersection::ResultDegenerateTriangle;
   if (sp == 0)
     m_point.SetVertexIntersection(1, 0);
   else if (sq == 0)
@@ -119,5 +119,5 @@ int RKMPolyTriangleSegmentIntersector::Intersect(const RKMMathPoint &a, const RK
   else
     m_point.SetBarIntersection(1, 0);
   m_count = 1;
-  return 1;
+  return RKMPolyIntersection::ResultOnePoint;
 }

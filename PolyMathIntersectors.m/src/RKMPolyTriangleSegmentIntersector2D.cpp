@@ -34,12 +34,12 @@ int RKMPolyTriangleSegmentIntersector2D::Intersect(const RKMMathPoint2D &a, cons
   for (int k = 0; k < 3; ++k)
     sigma[k] = ar.Orientation2D(p, q, *v[k]);
   if (sigma[0] == 0 && sigma[1] == 0 && sigma[2] == 0)
-    return p == q ? -5 : -6;
+    return p == q ? RKMPolyIntersection::ResultPointSegment : RKMPolyIntersection::ResultDegenerateTriangle;
   if (orientation == 0)
-    return -6;
+    return RKMPolyIntersection::ResultDegenerateTriangle;
   const int sum = sigma[0] + sigma[1] + sigma[2];
   if (sum == 3 || sum == -3)
-    return 0;
+    return RKMPolyIntersection::ResultDisjoint;
 
   const int s = RKMPolyCanonicalStartVertex(sigma[0], sigma[1], sigma[2]);
   const RKMMathPoint2D &p1 = *v[s], &q1 = *v[(s + 1) % 3], &r1 = *v[(s + 2) % 3];
@@ -71,7 +71,7 @@ int RKMPolyTriangleSegmentIntersector2D::Intersect(const RKMMathPoint2D &a, cons
 
   const int t1 = ar.Orientation2D(p1, r1, u);
   if (t1 == 1)
-    return 0;
+    return RKMPolyIntersection::ResultDisjoint;
   if (t1 == 0)
   {
     onBarThroughP1(pts[0], 2);
@@ -82,7 +82,7 @@ int RKMPolyTriangleSegmentIntersector2D::Intersect(const RKMMathPoint2D &a, cons
   {
     const int t2 = ar.Orientation2D(p1, q1, w);
     if (t2 == -1)
-      return 0;
+      return RKMPolyIntersection::ResultDisjoint;
     if (t2 == 0)
     {
       onBarThroughP1(pts[0], 0);

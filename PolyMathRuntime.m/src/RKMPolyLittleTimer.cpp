@@ -1,4 +1,5 @@
 #include "RKMPolyLittleTimer.h"
+#include "RKMPolyScopedMutex.h"
 
 #include "RKMInterlocked.h"
 #include "RKMMutex.h"
@@ -60,14 +61,12 @@ RKMPolyLittleTimer *RKMGetPolyLittleTimer(void *&slot)
 {
   if (void *t = __atomic_load_n(&slot, __ATOMIC_ACQUIRE))
     return static_cast<RKMPolyLittleTimer *>(t);
-  RKMMutex &m = RKMPolyLittleTimer::s_m();
-  (m.*RKMMutex::LockF)();
+  RKMPolyScopedMutex lock(RKMPolyLittleTimer::s_m());
   void *t = __atomic_load_n(&slot, __ATOMIC_ACQUIRE);
   if (!t)
   {
     t = new (std::nothrow) RKMPolyLittleTimer(0);
     __atomic_store_n(&slot, t, __ATOMIC_RELEASE);
   }
-  (m.*RKMMutex::UnlockF)();
   return static_cast<RKMPolyLittleTimer *>(t);
 }

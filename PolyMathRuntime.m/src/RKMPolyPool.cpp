@@ -1,5 +1,5 @@
+// RKMPolyPool and PoolMap, the table of pools it publishes: both are declared in RKMPolyPool.h.
 #include "RKMPolyPool.h"
-#include "RKMPolyThreads.h"
 
 #include "RKMSysAllocator.h"
 
@@ -25,5 +25,3 @@ void *RKMPolyPool::AllocateObjectInTSPool(unsigned size)
 void *RKMPolyPool::AllocateObjectInDefaultPool(unsigned size) { return AllocateObjectInTSPool(size); }
 
 void RKMPolyPool::FreeObjectFromPool(void *block) { RKMSpecializedDelete(block, nullptr, 0x400000); }
-
-RKMPolyThreads::~RKMPolyThreads() { Join(); }

@@ -1,4 +1,3 @@
-#include "RKMPolyAtomicOperations.h"
 #include "RKMRefCounted.h"
 
 #include "RKMInterlocked.h"
@@ -16,36 +15,3 @@ int RKMRefCounted::Release()
 }
 
 int RKMRefCounted::GetRefCount() const { return RKMInterlockedRead(&m_refCount); }
-
-int RKMPolyAtomicOperations::Increment(int *p) { return RKMInterlockedIncrement(p); }
-
-int RKMPolyAtomicOperations::Decrement(int *p) { return RKMInterlockedDecrement(p); }
-
-int RKMPolyAtomicOperations::CompareAndSwap(int *target, int exchange, int comparand)
-{
-  return RKMInterlockedCompareExchange(target, exchange, comparand);
-}
-
-int RKMPolyAtomicOperations::BitWiseOr(int *p, int bits)
-{
-  int before = RKMInterlockedCompareExchange(p, 0, 0);
-  for (;;)
-  {
-    const int seen = RKMInterlockedCompareExchange(p, before | bits, before);
-    if (seen == before)
-      return before;
-    before = seen;
-  }
-}
-
-int RKMPolyAtomicOperations::BitWiseTestAndReset(int *p, int bits)
-{
-  int before = RKMInterlockedCompareExchange(p, 0, 0);
-  for (;;)
-  {
-    const int seen = RKMInterlockedCompareExchange(p, before & ~bits, before);
-    if (seen == before)
-      return before;
-    before = seen;
-  }
-}

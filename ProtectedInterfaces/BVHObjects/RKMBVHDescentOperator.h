@@ -6,9 +6,15 @@
 class RKMBVHNodeConst;
 class RKMBVHTree;
 
-/// Depth-first walk of one hierarchy or of a pair, driven by hooks that a derived class overrides:
-/// Filter prunes, Choose picks the side to open, ProcessLeafNode(s) handle leaves, IsStopped ends the
-/// walk, End follows every pair that passed Filter. One operator serves one walk at a time.
+/// Depth-first walk of one hierarchy or of a pair, children in list order (null ones skipped), driven
+/// by hooks that a derived class overrides. One operator serves one walk at a time.
+///
+/// What a walk answers: a node, or a pair, that IsStopped or Filter turns away answers S_OK; a leaf
+/// (a pair of leaves) answers its ProcessLeafNode (ProcessLeafNodes); any other answers as the last
+/// child (child pair) it walked, S_OK when none. The single-tree walk ends at the first failed
+/// ProcessLeafNode and hands that failure up. The pair walk carries on past a failed
+/// ProcessLeafNodes, so the failure is lost unless it came from the last pair walked: an operator
+/// that must not lose one records it itself, or ends the walk through IsStopped.
 class RKM_EXPORT RKMBVHDescentOperator
 {
 public:
@@ -17,16 +23,18 @@ public:
   RKMBVHDescentOperator &operator=(const RKMBVHDescentOperator &) = default;
   virtual ~RKMBVHDescentOperator();
 
-  /// Walks one tree from its root. E_INVALIDARG when it has none; otherwise the walk's result.
+  /// Walks one tree from its root: E_INVALIDARG when it has none, otherwise the root's answer.
   HRESULT Descend(RKMBVHTree &tree);
-  /// Walks two trees from their roots. E_INVALIDARG when either has none; otherwise the walk's result.
+  /// Walks two trees from their roots: E_INVALIDARG when either has none, otherwise the roots' answer.
   HRESULT Descend(RKMBVHTree &first, RKMBVHTree &second);
 
   int GetDepth() const { return depth; }
   int GetDepth1() const { return depth1; }
   int GetDepth2() const { return depth2; }
 
-  /// Choose's answers; any other value opens both sides, as ChooseBoth does.
+  /// Choose's answers: ChooseFirst opens only a's children, ChooseSecond only b's, ChooseBoth (and
+  /// any other value) every pair of them, a's children outermost. A leaf is never opened: with one
+  /// side a leaf, the other side opens whatever the answer.
   enum ChooseSide : int
   {
     ChooseBoth = 0,
@@ -37,14 +45,16 @@ public:
 protected:
   /// Keeps the pair (true) or prunes it.
   virtual unsigned char Filter(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
+  /// Keeps the node (true) or prunes it.
   virtual unsigned char Filter(RKMBVHNodeConst &node);
   virtual HRESULT ProcessLeafNode(RKMBVHNodeConst &node);
-  /// True ends the walk at the next point where it is asked.
+  /// True ends the walk: asked before each node or pair, and before each child or child pair.
   virtual unsigned char IsStopped();
   virtual HRESULT ProcessLeafNodes(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
-  /// ChooseFirst opens only a's children, ChooseSecond only b's, anything else both.
+  /// Asked for each pair that passed Filter and is not two leaves; ChooseBoth here.
   virtual int Choose(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
-  /// Called after a pair that passed Filter has been handled.
+  /// Called for each pair that passed Filter, once it has been handled (its children walked, or the
+  /// walk stopped).
   virtual void End(RKMBVHNodeConst &a, RKMBVHNodeConst &b);
 
   /// The single-tree walk from any node.

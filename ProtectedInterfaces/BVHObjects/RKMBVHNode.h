@@ -20,7 +20,8 @@ public:
   RKMPolyBoundingVolume *GetFirstBoundingVolume() { return m_bv1; }
   using RKMBVHNodeConst::GetFirstBoundingVolume;
 
-  /// Stores bv (owned from now on); the previous volume is neither deleted nor returned.
+  /// The three setters store their argument, owned from now on; the one it replaces is neither
+  /// deleted nor returned.
   void SetFirstBoundingVolume(RKMPolyBoundingVolume *bv) { m_bv1 = bv; }
   void SetSecondBoundingVolume(RKMPolyBoundingVolume *bv) { m_bv2 = bv; }
   void SetAttribute(RKMBVHAttribute *attribute) { m_attribute = attribute; }
@@ -41,7 +42,7 @@ public:
   static void *operator new(std::size_t size) noexcept;
   static void operator delete(void *p) noexcept;
 
-  /// Iterator over the children as listed at construction, positions 1 to size.
+  /// As RKMBVHNodeConst::ConstIterator, with children that can be changed.
   class RKM_EXPORT Iterator
   {
   public:

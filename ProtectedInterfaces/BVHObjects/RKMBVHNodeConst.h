@@ -23,11 +23,10 @@ public:
   virtual const RKMPolyBoundingVolume *GetSecondBoundingVolume() const { return m_bv2; }
   virtual int GetNbChildren() const { return m_children.Size(); }
   virtual RKMBVHAttribute *GetAttribute() const { return m_attribute; }
-  /// Recurses into the children (null ones skipped).
+  /// ForceExpand, ForceCollapse and FlushMemory recurse into the children (null ones skipped);
+  /// FlushMemory then flushes the attribute's computed data.
   virtual void ForceExpand();
-  /// Recurses into the children (null ones skipped).
   virtual void ForceCollapse(int level);
-  /// Recurses into the children (null ones skipped), then flushes the attribute's computed data.
   virtual void FlushMemory();
   virtual RKMListPtrRKMBVHNodeConst &GetChildren() { return m_children; }
   /// 0 here.
@@ -36,7 +35,8 @@ public:
   const RKMPolyBoundingVolume *GetFirstBoundingVolume() const { return m_bv1; }
   const RKMListPtrRKMBVHNodeConst &GetChildren() const { return m_children; }
 
-  /// Iterator over the children as listed at construction, positions 1 to size.
+  /// Walks positions 1 to size of the children list GetChildren gives at construction; the list is
+  /// read as it stands at each step.
   class RKM_EXPORT ConstIterator
   {
   public:

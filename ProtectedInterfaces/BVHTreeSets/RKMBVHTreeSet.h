@@ -19,7 +19,8 @@ class RKMMutex;
 /// The hierarchies of several placed objects (each an integer id and its own tree) under one overall
 /// tree, rebuilt lazily the first time it is asked for after a change. The set makes one leaf per
 /// object, whose volumes are the object tree's root volumes placed by the object's transformation.
-/// Observers hear of every change first. Iterating the set walks its leaves. A set cannot be copied.
+/// Observers hear of every call that changes the set before it acts, also of one that then fails.
+/// Iterating the set walks its leaves. A set cannot be copied.
 class RKM_EXPORT RKMBVHTreeSet : public RKMBVHNodeIterator
 {
 public:

@@ -6,7 +6,7 @@
 class RKMBVHTree;
 class RKMMathTransformation;
 
-/// Told of every change of a tree set, before the set changes.
+/// Told of each change asked of a tree set, before the set acts on it.
 class RKM_EXPORT RKMBVHTreeSetObserver : public RKMPolyObserver<RKMBVHTreeSetObserver>
 {
 public:
@@ -19,7 +19,7 @@ public:
   virtual void OnRemoveTree(int id) = 0;
   virtual void OnVirtualRemoveTree(int id) = 0;
   virtual void OnFlushTree(int id) = 0;
-  /// Combined over all observers by bitwise AND.
+  /// This observer's part of RKMBVHTreeSet::CheckPoint.
   virtual int OnCheckPoint() = 0;
 
 protected:

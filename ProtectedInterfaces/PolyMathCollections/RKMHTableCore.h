@@ -385,6 +385,30 @@ private:
   Entry *m_end;
 };
 
+/// The iterators of the tables and typed containers: Iter's walk with End and ++, to which each adds
+/// the accessors of its entry kind.
+template <class Derived, class Entry>
+class TypedIter
+{
+public:
+  template <class Table>
+  explicit TypedIter(const Table &t) : m_it(t)
+  {
+  }
+  unsigned char End() const { return m_it.End(); }
+  Derived &operator++()
+  {
+    m_it.Next();
+    return static_cast<Derived &>(*this);
+  }
+
+protected:
+  Entry *Current() const { return m_it.Current(); }
+
+private:
+  Iter<Entry> m_it;
+};
+
 /// Elements hashed and compared through a comparison object when given, else by the hash function
 /// (default: RKMDefaultWordHash) and by value.
 struct GenericD

@@ -59,21 +59,12 @@ public:
   std::size_t SizeOf() const { return m_core.SizeOf(); }
 
   /// Walks the elements in entry order, as they stand when it is built.
-  class Iterator
+  class Iterator : public RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryD>
   {
   public:
-    explicit Iterator(const RKMTypedSet &s) : m_it(s.m_core) {}
-    unsigned char End() const { return m_it.End(); }
-    Iterator &operator++()
-    {
-      m_it.Next();
-      return *this;
-    }
-    E operator*() const { return RKMWordCast<E>::From(m_it.Current()->data); }
-    E GetData() const { return RKMWordCast<E>::From(m_it.Current()->data); }
-
-  private:
-    RKMHTableDetail::Iter<RKMHTableDetail::EntryD> m_it;
+    explicit Iterator(const RKMTypedSet &s) : RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryD>(s.m_core) {}
+    E operator*() const { return GetData(); }
+    E GetData() const { return RKMWordCast<E>::From(this->Current()->data); }
   };
 
 private:
@@ -131,21 +122,12 @@ public:
   std::size_t SizeOf() const { return m_core.SizeOf(); }
 
   /// Walks the entries in entry order, as they stand when it is built.
-  class Iterator
+  class Iterator : public RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryK>
   {
   public:
-    explicit Iterator(const RKMTypedMap &m) : m_it(m.m_core) {}
-    unsigned char End() const { return m_it.End(); }
-    Iterator &operator++()
-    {
-      m_it.Next();
-      return *this;
-    }
-    K GetKey() const { return RKMWordCast<K>::From(m_it.Current()->key); }
-    V GetData() const { return RKMWordCast<V>::From(m_it.Current()->data); }
-
-  private:
-    RKMHTableDetail::Iter<RKMHTableDetail::EntryK> m_it;
+    explicit Iterator(const RKMTypedMap &m) : RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryK>(m.m_core) {}
+    K GetKey() const { return RKMWordCast<K>::From(this->Current()->key); }
+    V GetData() const { return RKMWordCast<V>::From(this->Current()->data); }
   };
 
 private:
@@ -192,22 +174,13 @@ public:
   std::size_t SizeOf() const { return m_core.SizeOf(); }
 
   /// Walks the entries in entry order, as they stand when it is built.
-  class Iterator
+  class Iterator : public RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryKK>
   {
   public:
-    explicit Iterator(const RKMTypedMap2 &m) : m_it(m.m_core) {}
-    unsigned char End() const { return m_it.End(); }
-    Iterator &operator++()
-    {
-      m_it.Next();
-      return *this;
-    }
-    K GetKey1() const { return RKMWordCast<K>::From(m_it.Current()->key1); }
-    K GetKey2() const { return RKMWordCast<K>::From(m_it.Current()->key2); }
-    V GetData() const { return RKMWordCast<V>::From(m_it.Current()->data); }
-
-  private:
-    RKMHTableDetail::Iter<RKMHTableDetail::EntryKK> m_it;
+    explicit Iterator(const RKMTypedMap2 &m) : RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryKK>(m.m_core) {}
+    K GetKey1() const { return RKMWordCast<K>::From(this->Current()->key1); }
+    K GetKey2() const { return RKMWordCast<K>::From(this->Current()->key2); }
+    V GetData() const { return RKMWordCast<V>::From(this->Current()->data); }
   };
 
 private:

@@ -54,22 +54,13 @@ public:
   static RKMWord GetData(const RKMWord *handle) { return handle[0]; }
 
   /// Walks the elements in entry order, as they stand when it is built.
-  class Iterator
+  class Iterator : public RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryD>
   {
   public:
-    explicit Iterator(const RKMHTable_D &t) : m_it(t.m_core) {}
-    unsigned char End() const { return m_it.End(); }
-    Iterator &operator++()
-    {
-      m_it.Next();
-      return *this;
-    }
-    RKMWord operator*() const { return m_it.Current()->data; }
-    RKMWord GetData() const { return m_it.Current()->data; }
-    RKMWord *GetHandle() const { return reinterpret_cast<RKMWord *>(m_it.Current()); }
-
-  private:
-    RKMHTableDetail::Iter<RKMHTableDetail::EntryD> m_it;
+    explicit Iterator(const RKMHTable_D &t) : TypedIter(t.m_core) {}
+    RKMWord operator*() const { return Current()->data; }
+    RKMWord GetData() const { return Current()->data; }
+    RKMWord *GetHandle() const { return reinterpret_cast<RKMWord *>(Current()); }
   };
 
 private:

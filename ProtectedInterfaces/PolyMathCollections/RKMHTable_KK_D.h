@@ -61,23 +61,14 @@ public:
   static RKMWord GetData(const RKMWord *handle) { return handle[2]; }
 
   /// Walks the entries in entry order, as they stand when it is built.
-  class Iterator
+  class Iterator : public RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryKK>
   {
   public:
-    explicit Iterator(const RKMHTable_KK_D &t) : m_it(t.m_core) {}
-    unsigned char End() const { return m_it.End(); }
-    Iterator &operator++()
-    {
-      m_it.Next();
-      return *this;
-    }
-    RKMWord GetKey1() const { return m_it.Current()->key1; }
-    RKMWord GetKey2() const { return m_it.Current()->key2; }
-    RKMWord GetData() const { return m_it.Current()->data; }
-    RKMWord *GetHandle() const { return reinterpret_cast<RKMWord *>(m_it.Current()); }
-
-  private:
-    RKMHTableDetail::Iter<RKMHTableDetail::EntryKK> m_it;
+    explicit Iterator(const RKMHTable_KK_D &t) : TypedIter(t.m_core) {}
+    RKMWord GetKey1() const { return Current()->key1; }
+    RKMWord GetKey2() const { return Current()->key2; }
+    RKMWord GetData() const { return Current()->data; }
+    RKMWord *GetHandle() const { return reinterpret_cast<RKMWord *>(Current()); }
   };
 
 private:

@@ -63,22 +63,13 @@ public:
   static RKMWord GetData(const RKMWord *handle) { return handle[1]; }
 
   /// Walks the entries in entry order, as they stand when it is built.
-  class Iterator
+  class Iterator : public RKMHTableDetail::TypedIter<Iterator, RKMHTableDetail::EntryK>
   {
   public:
-    explicit Iterator(const RKMHTable_K_D &t) : m_it(t.m_core) {}
-    unsigned char End() const { return m_it.End(); }
-    Iterator &operator++()
-    {
-      m_it.Next();
-      return *this;
-    }
-    RKMWord GetKey() const { return m_it.Current()->key; }
-    RKMWord GetData() const { return m_it.Current()->data; }
-    RKMWord *GetHandle() const { return reinterpret_cast<RKMWord *>(m_it.Current()); }
-
-  private:
-    RKMHTableDetail::Iter<RKMHTableDetail::EntryK> m_it;
+    explicit Iterator(const RKMHTable_K_D &t) : TypedIter(t.m_core) {}
+    RKMWord GetKey() const { return Current()->key; }
+    RKMWord GetData() const { return Current()->data; }
+    RKMWord *GetHandle() const { return reinterpret_cast<RKMWord *>(Current()); }
   };
 
 private:

@@ -63,3 +63,6 @@ private:
     index[i] = idx;
   }
 };
+
+// Callers store and exchange the records as six ints.
+static_assert(sizeof(RKMPolyIntersectionPoint) == 6 * sizeof(int), "an intersection point is six ints");

@@ -15,13 +15,14 @@ class RKM_EXPORT RKMPolySegmentIntersector2D
 {
 public:
   explicit RKMPolySegmentIntersector2D(const RKMPolyExactArithmetic &arithmetic);
-  /// A null arithmetic makes every query answer -1 (undetermined).
+  /// A null arithmetic makes every query answer ResultUndetermined.
   explicit RKMPolySegmentIntersector2D(const RKMPolyExactArithmetic *arithmetic);
   RKMPolySegmentIntersector2D(const RKMPolyExactArithmetic &arithmetic,
                               const RKMPolyIntersectionPointConstructor2D &constructor);
 
-  /// -5 when a segment is a single point, 0 disjoint, 1 one common point, 2 a collinear overlap
-  /// (identical segments included), -1 undetermined.
+  /// ResultDisjoint (0); ResultOnePoint (1) for one common point; ResultTwoPoints (2) for a collinear
+  /// overlap, identical segments included; ResultPointSegment (-5) when a segment is a single point;
+  /// ResultUndetermined (-1) without an arithmetic.
   int Intersect(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c, const RKMMathPoint2D &d);
   /// The same, with the result also as a (type, error) pair.
   int Intersect(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c, const RKMMathPoint2D &d,
@@ -29,19 +30,19 @@ public:
 
   /// 1 when the last two segments were found on one line.
   unsigned char AreSegmentsColinear() const { return m_colinear; }
-  /// After a result of 1, the feature of segment i (0 for ab, 1 for cd) holding the point: 1 a vertex,
+  /// After ResultOnePoint, the feature of segment i (0 for ab, 1 for cd) holding the point: 1 a vertex,
   /// 2 its interior; 0 otherwise.
   int GetEntityType(int i) const { return i == 0 || i == 1 ? m_type[i] : 0; }
   /// The vertex (0 or 1) of segment i when its entity type is 1, else -1.
   int GetVertexIndex(int i) const { return GetEntityType(i) == 1 ? m_vertex[i] : -1; }
 
-  /// The coordinates of the common point after a result of 1: the shared extremity, or a constructed
+  /// The coordinates of the common point after ResultOnePoint: the shared extremity, or a constructed
   /// point (snapped in the Gridded mode); E_FAIL otherwise.
   HRESULT ConstructIntersection(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c,
                                 const RKMMathPoint2D &d, RKMMathPoint2D &out) const;
-  /// After a result of 1, which extremity (1 to 4 for a, b, c, d) lies closest to the other segment's
-  /// line; after a result of 2, the first of c, d, a, b lying strictly inside the other segment (0 for
-  /// none); E_FAIL after any other result.
+  /// After ResultOnePoint, which extremity (1 to 4 for a, b, c, d) lies closest to the other segment's
+  /// line; after ResultTwoPoints, the first of c, d, a, b lying strictly inside the other segment (0
+  /// for none); E_FAIL after any other answer.
   HRESULT GetClosestExtremity(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c,
                               const RKMMathPoint2D &d, int &which) const;
 
@@ -52,7 +53,7 @@ private:
   const RKMPolyExactArithmetic *m_arithmetic;
   const RKMPolyIntersectionPointConstructor2D *m_constructor = nullptr;
   unsigned char m_colinear = 0;
-  int m_result = -1;
+  int m_result = RKMPolyIntersection::ResultUndetermined;
   int m_type[2] = {0, 0};
   int m_vertex[2] = {0, 0};
 };

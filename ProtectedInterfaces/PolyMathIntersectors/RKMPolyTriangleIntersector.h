@@ -1,6 +1,7 @@
 #pragma once
 
 #include "RKMExport.h"
+#include "RKMPolyIntersection.h"
 #include "RKMPolyIntersectionPoint.h"
 
 class RKMMathPoint;
@@ -11,7 +12,7 @@ class RKMPolyTriangleIntersector2D;
 /// ends of the intersection segment, each described on the first triangle (slot 0) and the second
 /// (slot 1) in the caller's numbering. Coplanar pairs are projected onto a coordinate plane and
 /// answered by a 2D intersector the object owns. The arithmetic must outlive the intersector; a null
-/// one makes every query answer -1.
+/// one makes every query answer ResultUndetermined.
 class RKM_EXPORT RKMPolyTriangleIntersector
 {
 public:
@@ -22,16 +23,18 @@ public:
   RKMPolyTriangleIntersector &operator=(const RKMPolyTriangleIntersector &other);
   virtual ~RKMPolyTriangleIntersector();
 
-  /// 1 or 2: the number of points; 0 disjoint; after a coplanar pair the 2D intersector's result
-  /// (3, 2, 1, 0, or -6 for a degenerate first triangle); -6 when only the second triangle lies in
-  /// the first's plane; -2 for a sign combination the classification does not admit; -1 without
-  /// an arithmetic.
+  /// ResultOnePoint (1) or ResultTwoPoints (2): the number of points; ResultDisjoint (0); after a
+  /// coplanar pair the 2D intersector's answer (ResultPolygon (3), ResultTwoPoints, ResultOnePoint,
+  /// ResultDisjoint), or ResultDegenerateTriangle (-6) for a degenerate first triangle;
+  /// ResultDegenerateTriangle when only the second triangle lies in the first's plane;
+  /// ResultInadmissible (-2) for a sign combination the classification does not admit;
+  /// ResultUndetermined (-1) without an arithmetic.
   int Intersect(const RKMMathPoint &a1, const RKMMathPoint &b1, const RKMMathPoint &c1, const RKMMathPoint &a2,
                 const RKMMathPoint &b2, const RKMMathPoint &c2);
   /// Each pointer addresses three points.
   int Intersect(const RKMMathPoint *t1, const RKMMathPoint *t2);
-  /// Triangles s b1 c1 and s b2 c2 sharing vertex s; the same codes, with -2 where the six-point
-  /// test would find them apart.
+  /// Triangles s b1 c1 and s b2 c2 sharing vertex s; the same answers, with ResultInadmissible where
+  /// the six-point test would find them apart.
   int Intersect(const RKMMathPoint &s, const RKMMathPoint &b1, const RKMMathPoint &c1, const RKMMathPoint &b2,
                 const RKMMathPoint &c2);
   /// The points of the last query (the 2D intersector's after a coplanar one); null when none.

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "RKMExport.h"
+#include "RKMPolyIntersection.h"
 #include "RKMPolyIntersectionPoint.h"
 
 class RKMMathPoint2D;
@@ -18,11 +19,12 @@ public:
   RKMPolyTriangleIntersector2D &operator=(const RKMPolyTriangleIntersector2D &other) = default;
   ~RKMPolyTriangleIntersector2D() = default;
 
-  /// 3 when the intersection has three or more vertices, 2 for a segment, 1 for a point, 0 when
-  /// disjoint, -6 when a triangle is degenerate.
+  /// ResultPolygon (3) when the intersection has three or more vertices, ResultTwoPoints (2) for a
+  /// segment, ResultOnePoint (1) for a point, ResultDisjoint (0) when disjoint,
+  /// ResultDegenerateTriangle (-6) when a triangle is degenerate.
   int Intersect(const RKMMathPoint2D &a1, const RKMMathPoint2D &b1, const RKMMathPoint2D &c1, const RKMMathPoint2D &a2,
                 const RKMMathPoint2D &b2, const RKMMathPoint2D &c2);
-  /// Each pointer addresses three points.
+  /// Each pointer addresses three points; a null one counts as a degenerate triangle.
   int Intersect(const RKMMathPoint2D *t1, const RKMMathPoint2D *t2);
   /// The same answer by the same walk; kept for callers of the region-case entry point.
   int IntersectInConvergence(const RKMMathPoint2D *t1, const RKMMathPoint2D *t2);

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "RKMExport.h"
+#include "RKMPolyIntersection.h"
 #include "RKMPolyIntersectionPoint.h"
 
 class RKMMathPoint;
@@ -9,7 +10,8 @@ class RKMPolyTriangleSegmentIntersector2D;
 
 /// Exact intersection of a triangle (slot 0) and a segment (slot 1: vertices 0 and 1 its ends, bar 0
 /// its interior) in space. A segment in the triangle's plane is answered by a 2D intersector the
-/// object owns. The arithmetic must outlive the intersector; a null one makes every query answer -1.
+/// object owns. The arithmetic must outlive the intersector; a null one makes every query answer
+/// ResultUndetermined.
 class RKM_EXPORT RKMPolyTriangleSegmentIntersector
 {
 public:
@@ -20,9 +22,10 @@ public:
   RKMPolyTriangleSegmentIntersector &operator=(const RKMPolyTriangleSegmentIntersector &other);
   ~RKMPolyTriangleSegmentIntersector();
 
-  /// 1 when they meet in one point, 0 when not; for a segment in the triangle's plane the 2D
-  /// intersector's result (0, 1, 2, -5 for a single-point segment), or -6 for a degenerate
-  /// triangle; -1 without an arithmetic.
+  /// ResultOnePoint (1) when they meet in one point, ResultDisjoint (0) when not; for a segment in the
+  /// triangle's plane the 2D intersector's answer (ResultDisjoint, ResultOnePoint, ResultTwoPoints (2),
+  /// ResultPointSegment (-5) for a single-point segment); ResultDegenerateTriangle (-6) for a
+  /// degenerate triangle; ResultUndetermined (-1) without an arithmetic.
   int Intersect(const RKMMathPoint &a, const RKMMathPoint &b, const RKMMathPoint &c, const RKMMathPoint &p,
                 const RKMMathPoint &q);
   /// The point of the last query (the 2D intersector's after a coplanar one); null when none.

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "RKMExport.h"
+#include "RKMPolyIntersection.h"
 #include "RKMPolyIntersectionPoint.h"
 
 class RKMMathPoint2D;
@@ -17,8 +18,9 @@ public:
   RKMPolyTriangleSegmentIntersector2D(const RKMPolyTriangleSegmentIntersector2D &other) = default;
   RKMPolyTriangleSegmentIntersector2D &operator=(const RKMPolyTriangleSegmentIntersector2D &other) = default;
 
-  /// The number of points (0, 1 or 2); -5 when the segment is a single point, -6 when the triangle is
-  /// degenerate.
+  /// The number of points: ResultDisjoint (0), ResultOnePoint (1) or ResultTwoPoints (2);
+  /// ResultPointSegment (-5) when the segment is a single point, ResultDegenerateTriangle (-6) when
+  /// the triangle is degenerate.
   int Intersect(const RKMMathPoint2D &a, const RKMMathPoint2D &b, const RKMMathPoint2D &c, const RKMMathPoint2D &p,
                 const RKMMathPoint2D &q);
   /// n receives the count; null when there is no point.

@@ -1,3 +1,5 @@
+// The hash table and its iterator over one hash code's entries, both declared in RKMHashTable.h.
+
 #include "RKMHashTable.h"
 
 #include <cstdint>

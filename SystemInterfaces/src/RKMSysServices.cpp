@@ -1,3 +1,6 @@
+// The system services of the platform layer: environment settings, fatal-error and debug hooks,
+// memory fences and run-time symbol lookup, declared together in RKMSysServices.h.
+
 #include "RKMSysServices.h"
 
 #include <atomic>

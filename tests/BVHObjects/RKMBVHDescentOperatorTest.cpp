@@ -8,6 +8,7 @@
 #include "RKMPolyBVBVOperations.h"
 #include "RKMPolyBoundingCylinder.h"
 #include "RKMPolyBoundingSphere.h"
+#include "RKMRef.h"
 
 #include "RKMMathPoint.h"
 #include "RKMMathVector.h"
@@ -244,16 +245,9 @@ RKMBVHNode *Build(const Plain &t, int n)
   return node;
 }
 
-// The tree owns the hierarchy; the guard owns the tree.
-struct TreeGuard
-{
-  explicit TreeGuard(RKMBVHNode *root) : tree(new RKMBVHTree(root)) {}
-  explicit TreeGuard(const Plain &t) : TreeGuard(Build(t, 0)) {}
-  TreeGuard(const TreeGuard &) = delete;
-  TreeGuard &operator=(const TreeGuard &) = delete;
-  ~TreeGuard() { tree->Release(); }
-  RKMBVHTree *tree;
-};
+// The tree owns the hierarchy; the holder owns the tree.
+RKMRef<RKMBVHTree> MakeTree(RKMBVHNode *root) { return RKMRef<RKMBVHTree>::Adopt(new RKMBVHTree(root)); }
+RKMRef<RKMBVHTree> MakeTree(const Plain &t) { return MakeTree(Build(t, 0)); }
 
 // Shapes vary per tree: bushy or chain-like, with or without null children, leaves at mixed depths,
 // and now and then a node whose children are all null (which is not a leaf).
@@ -311,7 +305,7 @@ TEST(RKMBVHDescentOperator, SingleDescentMatchesTheReferenceOnRandomTrees)
     SCOPED_TRACE(::testing::Message() << "seed " << seed);
     std::mt19937_64 g(seed);
     const Plain plain = RandomTree(g, 60);
-    TreeGuard guard(plain);
+    const auto guard = MakeTree(plain);
     // First without a stop, to learn the length of the walk; then stopped somewhere inside it.
     long stopAfter = -1;
     for (int pass = 0; pass < 2; ++pass)
@@ -322,7 +316,7 @@ TEST(RKMBVHDescentOperator, SingleDescentMatchesTheReferenceOnRandomTrees)
       const HRESULT want = RefSingle(plain, 0, expected, depth);
       RecordingOperator op(actual);
       op.Scramble();
-      EXPECT_EQ(op.Descend(*guard.tree), want) << "pass " << pass;
+      EXPECT_EQ(op.Descend(*guard), want) << "pass " << pass;
       EXPECT_TRUE(SameLog(expected.log, actual.log)) << "pass " << pass;
       EXPECT_EQ(op.GetDepth(), 0);
       stopAfter = static_cast<long>(g() % (expected.log.size() + 1));
@@ -338,7 +332,7 @@ TEST(RKMBVHDescentOperator, PairDescentMatchesTheReferenceOnRandomTrees)
     SCOPED_TRACE(::testing::Message() << "seed " << seed);
     std::mt19937_64 g(seed * 7919);
     const Plain first = RandomTree(g, 30), second = RandomTree(g, 30);
-    TreeGuard a(first), b(second);
+    const auto a = MakeTree(first), b = MakeTree(second);
     long stopAfter = -1;
     for (int pass = 0; pass < 2; ++pass)
     {
@@ -348,7 +342,7 @@ TEST(RKMBVHDescentOperator, PairDescentMatchesTheReferenceOnRandomTrees)
       const HRESULT want = RefPair(first, 0, second, 0, expected, d1, d2);
       RecordingOperator op(actual);
       op.Scramble();
-      EXPECT_EQ(op.Descend(*a.tree, *b.tree), want) << "pass " << pass;
+      EXPECT_EQ(op.Descend(*a, *b), want) << "pass " << pass;
       EXPECT_TRUE(SameLog(expected.log, actual.log)) << "pass " << pass;
       EXPECT_EQ(op.GetDepth1(), 0);
       EXPECT_EQ(op.GetDepth2(), 0);
@@ -373,39 +367,39 @@ Plain Single()
 
 TEST(RKMBVHDescentOperator, FilterRejectingTheRootsEndsTheWalkAtOnce)
 {
-  TreeGuard a(Bushy()), b(Bushy());
+  const auto a = MakeTree(Bushy()), b = MakeTree(Bushy());
   Script s(1);
   s.filter1 = [](int) { return false; };
   s.filter2 = [](int, int) { return false; };
   RecordingOperator op(s);
-  EXPECT_EQ(op.Descend(*a.tree), S_OK);
+  EXPECT_EQ(op.Descend(*a), S_OK);
   EXPECT_EQ(s.log, (std::vector<std::string>{"stop?0", "filter 0 @0 ->0"}));
   s.log.clear();
-  EXPECT_EQ(op.Descend(*a.tree, *b.tree), S_OK);
+  EXPECT_EQ(op.Descend(*a, *b), S_OK);
   EXPECT_EQ(s.log, (std::vector<std::string>{"stop?0", "filter 0,0 @0,0 ->0"}));
 }
 
 TEST(RKMBVHDescentOperator, TwoSingleNodeTreesMeetOnce)
 {
-  TreeGuard a(Single()), b(Single());
+  const auto a = MakeTree(Single()), b = MakeTree(Single());
   Script s(1);
   s.filter2 = [](int, int) { return true; };
   s.leaf2 = [](int, int) { return S_FALSE; };
   RecordingOperator op(s);
-  EXPECT_EQ(op.Descend(*a.tree, *b.tree), S_FALSE);
+  EXPECT_EQ(op.Descend(*a, *b), S_FALSE);
   EXPECT_EQ(s.log, (std::vector<std::string>{"stop?0", "filter 0,0 @0,0 ->1", "leaves 0,0 @0,0", "end 0,0 @0,0"}));
 }
 
 TEST(RKMBVHDescentOperator, ALeafOnlyOpensTheOtherSide)
 {
-  TreeGuard leaf(Single()), deep(Bushy());
+  const auto leaf = MakeTree(Single()), deep = MakeTree(Bushy());
   Script s(1);
   s.filter2 = [](int, int) { return true; };
   s.leaf2 = [](int, int) { return S_OK; };
   // Asking to open the leaf's side must be ignored: it has nothing to open.
   s.choose = [](int, int) { return 1; };
   RecordingOperator op(s);
-  EXPECT_EQ(op.Descend(*leaf.tree, *deep.tree), S_OK);
+  EXPECT_EQ(op.Descend(*leaf, *deep), S_OK);
   const std::vector<std::string> expected = {
       "stop?0", "filter 0,0 @0,0 ->1", "choose 0,0 @0,0 ->1",
       "stop?0", "stop?0", "filter 0,1 @0,1 ->1", "choose 0,1 @0,1 ->1",
@@ -424,7 +418,7 @@ TEST(RKMBVHDescentOperator, ALeafOnlyOpensTheOtherSide)
   t.leaf2 = s.leaf2;
   t.choose = [](int, int) { return 2; };
   RecordingOperator op2(t);
-  EXPECT_EQ(op2.Descend(*deep.tree, *leaf.tree), S_OK);
+  EXPECT_EQ(op2.Descend(*deep, *leaf), S_OK);
   ASSERT_EQ(t.log.size(), expected.size());
   EXPECT_EQ(t.log[9], "filter 3,0 @2,0 ->1");
   EXPECT_EQ(t.log[18], "stop?0");
@@ -435,7 +429,7 @@ TEST(RKMBVHDescentOperator, StopInsideALeafPairEndsTheWalkButClosesOpenPairs)
 {
   Plain two;
   two.kids = {{1, 2}, {}, {}};
-  TreeGuard a(two), b(two);
+  const auto a = MakeTree(two), b = MakeTree(two);
   Script s(1);
   s.filter2 = [](int, int) { return true; };
   s.leaf2 = [](int, int) { return E_FAIL; };
@@ -443,7 +437,7 @@ TEST(RKMBVHDescentOperator, StopInsideALeafPairEndsTheWalkButClosesOpenPairs)
   s.stopInLeaves = true;
   RecordingOperator op(s);
   // The failed leaf pair is the last one descended: its result is the walk's.
-  EXPECT_EQ(op.Descend(*a.tree, *b.tree), E_FAIL);
+  EXPECT_EQ(op.Descend(*a, *b), E_FAIL);
   const std::vector<std::string> expected = {
       "stop?0", "filter 0,0 @0,0 ->1", "choose 0,0 @0,0 ->0",
       "stop?0", "stop?0", "filter 1,1 @1,1 ->1", "leaves 1,1 @1,1", "end 1,1 @1,1",
@@ -454,12 +448,12 @@ TEST(RKMBVHDescentOperator, StopInsideALeafPairEndsTheWalkButClosesOpenPairs)
 
 TEST(RKMBVHDescentOperator, FailingLeafEndsTheSingleDescent)
 {
-  TreeGuard t(Bushy());
+  const auto t = MakeTree(Bushy());
   Script s(1);
   s.filter1 = [](int) { return true; };
   s.leaf1 = [](int n) { return n == 3 ? E_FAIL : S_OK; };
   RecordingOperator op(s);
-  EXPECT_EQ(op.Descend(*t.tree), E_FAIL);
+  EXPECT_EQ(op.Descend(*t), E_FAIL);
   EXPECT_TRUE(SameLog({"stop?0", "filter 0 @0 ->1", "stop?0", "stop?0", "filter 1 @1 ->1", "stop?0", "stop?0",
                        "filter 3 @2 ->1", "leaf 3 @2"},
                       s.log));
@@ -467,17 +461,17 @@ TEST(RKMBVHDescentOperator, FailingLeafEndsTheSingleDescent)
 
 TEST(RKMBVHDescentOperator, TreesWithoutRootAreRejected)
 {
-  TreeGuard empty(nullptr), full(Bushy());
+  const auto empty = MakeTree(nullptr), full = MakeTree(Bushy());
   Script s(1);
   RecordingOperator op(s);
   op.Scramble();
-  EXPECT_EQ(op.Descend(*empty.tree), E_INVALIDARG);
+  EXPECT_EQ(op.Descend(*empty), E_INVALIDARG);
   EXPECT_EQ(op.GetDepth(), 0);
   op.Scramble();
-  EXPECT_EQ(op.Descend(*empty.tree, *full.tree), E_INVALIDARG);
+  EXPECT_EQ(op.Descend(*empty, *full), E_INVALIDARG);
   EXPECT_EQ(op.GetDepth1(), 0);
   EXPECT_EQ(op.GetDepth2(), 0);
-  EXPECT_EQ(op.Descend(*full.tree, *empty.tree), E_INVALIDARG);
+  EXPECT_EQ(op.Descend(*full, *empty), E_INVALIDARG);
   EXPECT_TRUE(s.log.empty());
 }
 
@@ -518,7 +512,7 @@ TEST(RKMBVHDescentOperator, UnboundedLeafIsNeverPrunedByItsAncestors)
   RKMBVHNode *root = VolumeLeaf(0, new RKMPolyAABB(RKMPolyBoxf(2.f, 3.f, 0.f, 1.f, 0.f, 1.f)));
   ASSERT_TRUE(SUCCEEDED(root->AbsorbChild(VolumeLeaf(2, new RKMPolyAABB(RKMPolyBoxf(2.f, 3.f, 0.f, 1.f, 0.f, 1.f))))));
   ASSERT_TRUE(SUCCEEDED(root->AbsorbChild(mid)));
-  TreeGuard withCylinder(root);
+  const auto withCylinder = MakeTree(root);
 
   const std::vector<RKMPolyBoundingVolume *> farVolumes = {
       new RKMPolyAABB(RKMPolyBoxf(999.f, 1001.f, 99.f, 101.f, 99.f, 101.f)),
@@ -526,12 +520,12 @@ TEST(RKMBVHDescentOperator, UnboundedLeafIsNeverPrunedByItsAncestors)
   for (RKMPolyBoundingVolume *bv : farVolumes)
   {
     SCOPED_TRACE(bv->GetTypeID());
-    TreeGuard far(VolumeLeaf(0, bv));
+    const auto far = MakeTree(VolumeLeaf(0, bv));
     OverlapOperator op;
-    EXPECT_EQ(op.Descend(*withCylinder.tree, *far.tree), S_OK);
+    EXPECT_EQ(op.Descend(*withCylinder, *far), S_OK);
     EXPECT_EQ(op.hits, (std::vector<std::pair<int, int>>{{4, 0}}));
     op.hits.clear();
-    EXPECT_EQ(op.Descend(*far.tree, *withCylinder.tree), S_OK);
+    EXPECT_EQ(op.Descend(*far, *withCylinder), S_OK);
     EXPECT_EQ(op.hits, (std::vector<std::pair<int, int>>{{0, 4}}));
   }
 }
@@ -547,11 +541,11 @@ public:
 
 TEST(RKMBVHPickingOperator, RunReportsFailureWithoutCallingBack)
 {
-  TreeGuard t(Bushy());
+  const auto t = MakeTree(Bushy());
   SilentCallback cb;
   RKMBVHPickingOperator picking(cb, 0.25);
   EXPECT_EQ(picking.GetTolerance(), 0.25);
-  EXPECT_EQ(picking.Run(*t.tree, RKMMathPoint(0, 0, 0), RKMMathVector(1, 0, 0)), E_FAIL);
+  EXPECT_EQ(picking.Run(*t, RKMMathPoint(0, 0, 0), RKMMathVector(1, 0, 0)), E_FAIL);
   EXPECT_EQ(cb.calls, 0);
 }
 }

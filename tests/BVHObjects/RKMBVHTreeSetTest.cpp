@@ -8,6 +8,7 @@
 #include "RKMMathTransformation.h"
 #include "RKMPolyAABB.h"
 #include "RKMPolyBVProperties.h"
+#include "RKMRef.h"
 
 #include <gtest/gtest.h>
 
@@ -26,14 +27,23 @@ static_assert(!std::is_copy_assignable<RKMBVHTreeSet>::value, "a set owns its le
 
 namespace
 {
+using TreeRef = RKMRef<RKMBVHTree>;
+
+// Holds a reference the caller already owns.
+template <class T>
+RKMRef<T> Adopt(T *object)
+{
+  return RKMRef<T>::Adopt(object);
+}
+
 // An object tree over the box [x, x+1] × [0,1] × [0,1], optionally with a second volume on the root.
-RKMBVHTree *MakeObject(double x, bool withSecond = false)
+TreeRef MakeObject(double x, bool withSecond = false)
 {
   RKMBVHNode *root = new RKMBVHNode(new RKMPolyAABB(RKMMathBox(x, x + 1, 0, 1, 0, 1)));
   if (withSecond)
     root->SetSecondBoundingVolume(new RKMPolyAABB(RKMMathBox(x, x + 2, 0, 2, 0, 2)));
   root->AbsorbChild(new RKMBVHNode(new RKMPolyAABB(RKMMathBox(x, x + 0.5, 0, 0.5, 0, 0.5))));
-  return new RKMBVHTree(root);
+  return Adopt(new RKMBVHTree(root));
 }
 
 bool Inside(const RKMPolyBoundingVolume *bv, const RKMMathPoint &p)
@@ -125,8 +135,8 @@ void Walk(const RKMBVHNodeConst *node, std::vector<const RKMBVHNodeConst *> &anc
   ancestors.pop_back();
 }
 
-std::map<const RKMBVHNodeConst *, int> LeavesOf(RKMBVHTree *tree,
-                                                const std::map<const RKMBVHNodeConst *, std::vector<RKMMathPoint>> &samples = {})
+std::map<const RKMBVHNodeConst *, int>
+LeavesOf(const TreeRef &tree, const std::map<const RKMBVHNodeConst *, std::vector<RKMMathPoint>> &samples = {})
 {
   std::map<const RKMBVHNodeConst *, int> seen;
   std::vector<const RKMBVHNodeConst *> ancestors;
@@ -147,18 +157,17 @@ std::vector<int> IdsInOrder(RKMBVHTreeSet &set)
 TEST(RKMBVHTreeSetTest, AddTreeMakesOnePlacedLeafAndTakesOneReference)
 {
   RKMBVHTreeSet set;
-  RKMBVHTree *plain = MakeObject(0, true);
-  RKMBVHTree *moved = MakeObject(0);
+  TreeRef plain = MakeObject(0, true), moved = MakeObject(0);
   const RKMMathTransformation shift(RKMMathVector(10, 0, 0));
-  EXPECT_EQ(set.AddTree(1, plain, nullptr), S_OK);
-  EXPECT_EQ(set.AddTree(2, moved, &shift), S_OK);
+  EXPECT_EQ(set.AddTree(1, plain.Get(), nullptr), S_OK);
+  EXPECT_EQ(set.AddTree(2, moved.Get(), &shift), S_OK);
   EXPECT_EQ(plain->GetRefCount(), 2);
   EXPECT_EQ(moved->GetRefCount(), 2);
 
   const RKMBVHNodeConst *leaf1 = NodeOf(set, 1);
   ASSERT_NE(leaf1, nullptr);
   EXPECT_EQ(leaf1->GetNbChildren(), 0);
-  EXPECT_EQ(RKMBVHTreeSet::GetTree(*leaf1), plain);
+  EXPECT_EQ(RKMBVHTreeSet::GetTree(*leaf1), plain.Get());
   EXPECT_EQ(RKMBVHTreeSet::GetObjectId(*leaf1), 1);
   EXPECT_TRUE(RKMBVHTreeSet::IsActivated(*leaf1));
   EXPECT_TRUE(RKMBVHTreeSet::GetPosition(*leaf1).IsIdentity());
@@ -182,22 +191,16 @@ TEST(RKMBVHTreeSetTest, AddTreeMakesOnePlacedLeafAndTakesOneReference)
   EXPECT_TRUE(*RKMBVHTreeSet::GetTransformation(*leaf2) == shift);
   // The object trees themselves are left where they are.
   EXPECT_TRUE(Inside(moved->GetRoot()->GetFirstBoundingVolume(), RKMMathPoint(0.5, 0.5, 0.5)));
-
-  plain->Release();
-  moved->Release();
 }
 
 TEST(RKMBVHTreeSetTest, PlacementKeepsScalingsAndSnapsOtherMatricesToIsometries)
 {
   RKMBVHTreeSet set;
-  RKMBVHTree *a = MakeObject(0), *b = MakeObject(0);
   const RKMMathTransformation scaling(RKMMath3x3Matrix(2, 0, 0, 0, 2, 0, 0, 0, 2), RKMMathVector(0, 0, 0));
   // The nearest isometry to diag(2, 1, 1) is the identity: the stretch along x must disappear.
   const RKMMathTransformation stretch(RKMMath3x3Matrix(2, 0, 0, 0, 1, 0, 0, 0, 1), RKMMathVector(0, 5, 0));
-  ASSERT_EQ(set.AddTree(1, a, &scaling), S_OK);
-  ASSERT_EQ(set.AddTree(2, b, &stretch), S_OK);
-  a->Release();
-  b->Release();
+  ASSERT_EQ(set.AddTree(1, MakeObject(0).Get(), &scaling), S_OK);
+  ASSERT_EQ(set.AddTree(2, MakeObject(0).Get(), &stretch), S_OK);
 
   const RKMBVHNodeConst *scaled = NodeOf(set, 1), *snapped = NodeOf(set, 2);
   ASSERT_TRUE(scaled && snapped);
@@ -217,34 +220,29 @@ TEST(RKMBVHTreeSetTest, AddTreeRejectsNullAndRootlessTreesAndKeepsTheFirstLeafOf
 {
   RKMBVHTreeSet set;
   EXPECT_EQ(set.AddTree(1, nullptr, nullptr), E_INVALIDARG);
-  RKMBVHTree *empty = new RKMBVHTree(nullptr);
-  EXPECT_EQ(set.AddTree(1, empty, nullptr), E_FAIL);
+  TreeRef empty = Adopt(new RKMBVHTree(nullptr));
+  EXPECT_EQ(set.AddTree(1, empty.Get(), nullptr), E_FAIL);
   EXPECT_EQ(empty->GetRefCount(), 1);
   EXPECT_TRUE(IdsInOrder(set).empty());
   EXPECT_EQ(NodeOf(set, 1), nullptr);
-  RKMBVHTree *none = set.GetTree();
-  EXPECT_EQ(none, nullptr);
-  empty->Release();
+  EXPECT_EQ(Adopt(set.GetTree()).Get(), nullptr);
 
-  RKMBVHTree *first = MakeObject(0), *second = MakeObject(5);
-  ASSERT_EQ(set.AddTree(7, first, nullptr), S_OK);
-  EXPECT_EQ(set.AddTree(7, second, nullptr), E_FAIL);
+  TreeRef first = MakeObject(0), second = MakeObject(5);
+  ASSERT_EQ(set.AddTree(7, first.Get(), nullptr), S_OK);
+  EXPECT_EQ(set.AddTree(7, second.Get(), nullptr), E_FAIL);
   const RKMBVHNodeConst *kept = NodeOf(set, 7);
   ASSERT_NE(kept, nullptr);
-  EXPECT_EQ(RKMBVHTreeSet::GetTree(*kept), first);
+  EXPECT_EQ(RKMBVHTreeSet::GetTree(*kept), first.Get());
   EXPECT_EQ(IdsInOrder(set), (std::vector<int>{7, 7}));
 
-  RKMBVHTree *overall = set.GetTree();
-  ASSERT_NE(overall, nullptr);
+  TreeRef overall = Adopt(set.GetTree());
+  ASSERT_NE(overall.Get(), nullptr);
   const auto leaves = LeavesOf(overall);
   EXPECT_EQ(leaves.size(), 2u);
   EXPECT_EQ(leaves.count(kept), 1u);
-  overall->Release();
 
   // The refused duplicate still holds its tree until the set goes.
   EXPECT_EQ(second->GetRefCount(), 2);
-  first->Release();
-  second->Release();
 }
 
 TEST(RKMBVHTreeSetTest, OverallTreeIsSharedUntilAChangeDropsIt)
@@ -254,49 +252,45 @@ TEST(RKMBVHTreeSetTest, OverallTreeIsSharedUntilAChangeDropsIt)
   const double xs[] = {0, 3, 40, -20, 7};
   for (int id = 0; id < 5; ++id)
   {
-    RKMBVHTree *t = MakeObject(xs[id]);
     const RKMMathTransformation shift(RKMMathVector(0, id * 4.0, 0));
-    ASSERT_EQ(set.AddTree(id, t, &shift), S_OK);
-    t->Release();
+    ASSERT_EQ(set.AddTree(id, MakeObject(xs[id]).Get(), &shift), S_OK);
     const double y = id * 4.0;
     samples[NodeOf(set, id)] = {RKMMathPoint(xs[id], y, 0), RKMMathPoint(xs[id] + 1, y + 1, 1),
                                 RKMMathPoint(xs[id] + 0.5, y + 0.5, 0.5)};
   }
 
-  RKMBVHTree *t1 = set.GetTree();
-  RKMBVHTree *t2 = set.GetTree();
-  ASSERT_NE(t1, nullptr);
-  EXPECT_EQ(t1, t2);
+  TreeRef t1 = Adopt(set.GetTree()), t2 = Adopt(set.GetTree());
+  ASSERT_NE(t1.Get(), nullptr);
+  EXPECT_EQ(t1.Get(), t2.Get());
   EXPECT_EQ(t1->GetRefCount(), 3);
   const auto leaves = LeavesOf(t1, samples);
   EXPECT_EQ(leaves.size(), 5u);
   for (const auto &entry : samples)
     EXPECT_EQ(leaves.count(entry.first) ? leaves.at(entry.first) : 0, 1);
-  t2->Release();
+  t2.Reset();
 
   // The holder keeps a valid, rootless tree; the object leaves outlive it.
   EXPECT_EQ(set.DesactivateTree(3), S_OK);
   EXPECT_EQ(t1->GetRoot(), nullptr);
   EXPECT_EQ(t1->GetRefCount(), 1);
-  t1->Release();
+  t1.Reset();
   const RKMBVHNodeConst *leaf0 = NodeOf(set, 0);
   ASSERT_NE(leaf0, nullptr);
   EXPECT_TRUE(Inside(leaf0->GetFirstBoundingVolume(), RKMMathPoint(0.5, 0.5, 0.5)));
 
-  RKMBVHTree *t3 = set.GetTree();
-  ASSERT_NE(t3, nullptr);
+  TreeRef t3 = Adopt(set.GetTree());
+  ASSERT_NE(t3.Get(), nullptr);
   EXPECT_FALSE(RKMBVHTreeSet::IsActivated(*NodeOf(set, 3)));
   const auto active = LeavesOf(t3, samples);
   EXPECT_EQ(active.size(), 4u);
   EXPECT_EQ(active.count(NodeOf(set, 3)), 0u);
-  t3->Release();
 }
 
 TEST(RKMBVHTreeSetTest, EveryChangeDropsTheOverallTree)
 {
   const RKMMathTransformation shift(RKMMathVector(1, 2, 3));
   const std::vector<std::pair<const char *, std::function<void(RKMBVHTreeSet &)>>> changes = {
-      {"add", [](RKMBVHTreeSet &s) { RKMBVHTree *t = MakeObject(9); s.AddTree(3, t, nullptr); t->Release(); }},
+      {"add", [](RKMBVHTreeSet &s) { s.AddTree(3, MakeObject(9).Get(), nullptr); }},
       {"remove", [](RKMBVHTreeSet &s) { s.RemoveTree(2); }},
       {"move", [&shift](RKMBVHTreeSet &s) { s.ModifyTreePosition(1, &shift); }},
       {"off", [](RKMBVHTreeSet &s) { s.DesactivateTree(1); }},
@@ -310,66 +304,54 @@ TEST(RKMBVHTreeSetTest, EveryChangeDropsTheOverallTree)
   {
     RKMBVHTreeSet set;
     for (int id = 1; id <= 2; ++id)
-    {
-      RKMBVHTree *t = MakeObject(id * 3.0);
-      ASSERT_EQ(set.AddTree(id, t, nullptr), S_OK);
-      t->Release();
-    }
-    RKMBVHTree *before = set.GetTree();
-    ASSERT_NE(before, nullptr) << change.first;
+      ASSERT_EQ(set.AddTree(id, MakeObject(id * 3.0).Get(), nullptr), S_OK);
+    const TreeRef before = Adopt(set.GetTree());
+    ASSERT_NE(before.Get(), nullptr) << change.first;
     change.second(set);
     EXPECT_EQ(before->GetRoot(), nullptr) << change.first;
-    RKMBVHTree *after = set.GetTree();
-    if (after)
+    if (const TreeRef after = Adopt(set.GetTree()))
     {
-      EXPECT_NE(after, before) << change.first;
+      EXPECT_NE(after.Get(), before.Get()) << change.first;
       EXPECT_NE(after->GetRoot(), nullptr) << change.first;
-      after->Release();
     }
-    before->Release();
   }
 }
 
 TEST(RKMBVHTreeSetTest, ActivationDecidesWhichLeavesTheOverallTreeHolds)
 {
   RKMBVHTreeSet set;
-  RKMBVHTree *a = MakeObject(0), *b = MakeObject(4);
-  ASSERT_EQ(set.AddTree(1, a, nullptr), S_OK);
-  RKMBVHTree *single = set.GetTree();
-  ASSERT_NE(single, nullptr);
+  TreeRef a = MakeObject(0), b = MakeObject(4);
+  ASSERT_EQ(set.AddTree(1, a.Get(), nullptr), S_OK);
+  TreeRef single = Adopt(set.GetTree());
+  ASSERT_NE(single.Get(), nullptr);
   EXPECT_EQ(single->GetRoot(), NodeOf(set, 1));
-  single->Release();
+  single.Reset();
 
-  ASSERT_EQ(set.AddTree(2, b, nullptr), S_OK);
+  ASSERT_EQ(set.AddTree(2, b.Get(), nullptr), S_OK);
   EXPECT_EQ(set.DeactivateAll(), S_OK);
   EXPECT_FALSE(RKMBVHTreeSet::IsActivated(*NodeOf(set, 1)));
-  EXPECT_EQ(set.GetTree(), nullptr);
+  EXPECT_EQ(Adopt(set.GetTree()).Get(), nullptr);
   EXPECT_EQ(set.ActivateTree(2), S_OK);
-  RKMBVHTree *only = set.GetTree();
-  ASSERT_NE(only, nullptr);
+  TreeRef only = Adopt(set.GetTree());
+  ASSERT_NE(only.Get(), nullptr);
   EXPECT_EQ(only->GetRoot(), NodeOf(set, 2));
-  only->Release();
+  only.Reset();
   EXPECT_EQ(set.ActivateAll(), S_OK);
-  RKMBVHTree *both = set.GetTree();
-  EXPECT_EQ(LeavesOf(both).size(), 2u);
-  both->Release();
-  a->Release();
-  b->Release();
+  EXPECT_EQ(LeavesOf(Adopt(set.GetTree())).size(), 2u);
 }
 
 TEST(RKMBVHTreeSetTest, RemoveFlushAndMoveReachTheObjectTree)
 {
   RKMBVHTreeSet set;
-  RKMBVHTree *a = MakeObject(0), *b = MakeObject(5, true);
-  TreeSpy *spyA = new TreeSpy, *spyB = new TreeSpy;
-  spyA->AddRef();
-  a->RegisterObserver(spyA);
+  TreeRef a = MakeObject(0), b = MakeObject(5, true);
+  const RKMRef<TreeSpy> spyA = Adopt(new TreeSpy);
+  TreeSpy *spyB = new TreeSpy;
+  a->RegisterObserver(spyA.Get());
   b->RegisterObserver(spyB);
-  spyB->Release();
-  ASSERT_EQ(set.AddTree(1, a, nullptr), S_OK);
-  ASSERT_EQ(set.AddTree(2, b, nullptr), S_OK);
-  a->Release();
-  spyA->Release();
+  spyB->Release();  // b now holds spyB's only reference
+  ASSERT_EQ(set.AddTree(1, a.Get(), nullptr), S_OK);
+  ASSERT_EQ(set.AddTree(2, b.Get(), nullptr), S_OK);
+  a.Reset();
 
   EXPECT_EQ(set.FlushTree(1), S_OK);
   EXPECT_EQ(spyA->flushes.load(), 1);
@@ -393,18 +375,16 @@ TEST(RKMBVHTreeSetTest, RemoveFlushAndMoveReachTheObjectTree)
   EXPECT_EQ(NodeOf(set, 1), nullptr);
   EXPECT_EQ(set.RemoveTree(1), E_INVALIDARG);
   EXPECT_EQ(IdsInOrder(set), (std::vector<int>{2}));
-  spyA->Release();
 
   // b is still ours too: the set's destruction releases only its own reference.
   EXPECT_EQ(b->GetRefCount(), 2);
   {
     RKMBVHTreeSet other;
-    ASSERT_EQ(other.AddTree(1, b, nullptr), S_OK);
+    ASSERT_EQ(other.AddTree(1, b.Get(), nullptr), S_OK);
     EXPECT_EQ(b->GetRefCount(), 3);
   }
   EXPECT_EQ(b->GetRefCount(), 2);
   EXPECT_EQ(spyB->deletions.load(), 0);
-  b->Release();
 }
 
 TEST(RKMBVHTreeSetTest, StaticAccessorsOnANodeWithoutAttribute)
@@ -424,11 +404,7 @@ TEST(RKMBVHTreeSetTest, IterationFollowsOrderOfAddition)
 {
   RKMBVHTreeSet set;
   for (int id : {5, 1, 3, 9})
-  {
-    RKMBVHTree *t = MakeObject(id);
-    ASSERT_EQ(set.AddTree(id, t, nullptr), S_OK);
-    t->Release();
-  }
+    ASSERT_EQ(set.AddTree(id, MakeObject(id).Get(), nullptr), S_OK);
   EXPECT_EQ(IdsInOrder(set), (std::vector<int>{5, 1, 3, 9}));
   ASSERT_EQ(set.RemoveTree(1), S_OK);
   EXPECT_EQ(IdsInOrder(set), (std::vector<int>{5, 3, 9}));
@@ -440,11 +416,11 @@ TEST(RKMBVHTreeSetTest, ObserversHearEveryChangeFirstAndInOrder)
 {
   std::vector<std::string> journal;
   auto set = std::make_unique<RKMBVHTreeSet>();
-  SetSpy *a = new SetSpy(&journal, "A", 3), *b = new SetSpy(&journal, "B", 5);
+  const auto a = Adopt(new SetSpy(&journal, "A", 3)), b = Adopt(new SetSpy(&journal, "B", 5));
   EXPECT_EQ(set->CheckPoint(), -1);
-  set->RegisterObserver(a);
-  set->RegisterObserver(b);
-  set->RegisterObserver(a);  // already there: no second entry
+  set->RegisterObserver(a.Get());
+  set->RegisterObserver(b.Get());
+  set->RegisterObserver(a.Get());  // already there: no second entry
   RKMBVHTreeSet *s = set.get();
   a->hook = [s](SetSpy &, const std::string &what, int id) {
     // Nothing has changed yet when observers hear of it.
@@ -459,8 +435,8 @@ TEST(RKMBVHTreeSetTest, ObserversHearEveryChangeFirstAndInOrder)
   };
   const int countA = a->GetRefCount();
 
-  RKMBVHTree *t = MakeObject(0);
-  EXPECT_EQ(set->AddTree(1, t, nullptr), S_OK);
+  const TreeRef t = MakeObject(0);
+  EXPECT_EQ(set->AddTree(1, t.Get(), nullptr), S_OK);
   EXPECT_EQ(set->AddTree(2, nullptr, nullptr), E_INVALIDARG);
   set->ModifyTreePosition(1, nullptr);
   set->DesactivateTree(1);
@@ -481,8 +457,8 @@ TEST(RKMBVHTreeSetTest, ObserversHearEveryChangeFirstAndInOrder)
   EXPECT_EQ(a->GetRefCount(), countA);
 
   // Destruction releases each observer once, without a word to it, and releases the object tree.
-  t->AddRef();
-  EXPECT_EQ(set->AddTree(4, t, nullptr), S_OK);
+  const TreeRef again = t;
+  EXPECT_EQ(set->AddTree(4, t.Get(), nullptr), S_OK);
   EXPECT_EQ(t->GetRefCount(), 3);
   journal.clear();
   set.reset();
@@ -490,10 +466,6 @@ TEST(RKMBVHTreeSetTest, ObserversHearEveryChangeFirstAndInOrder)
   EXPECT_EQ(a->GetRefCount(), countA - 1);
   EXPECT_EQ(b->GetRefCount(), 1);
   EXPECT_EQ(t->GetRefCount(), 2);
-  a->Release();
-  b->Release();
-  t->Release();
-  t->Release();
 }
 
 TEST(RKMBVHTreeSetTest, ObserverMayUnregisterItselfDuringANotification)
@@ -521,34 +493,28 @@ TEST(RKMBVHTreeSetTest, ConcurrentGetTreeBuildsOnce)
 {
   RKMBVHTreeSet set;
   for (int id = 0; id < 12; ++id)
-  {
-    RKMBVHTree *t = MakeObject(id * 2.0);
-    ASSERT_EQ(set.AddTree(id, t, nullptr), S_OK);
-    t->Release();
-  }
+    ASSERT_EQ(set.AddTree(id, MakeObject(id * 2.0).Get(), nullptr), S_OK);
   constexpr int kThreads = 6;
   for (int round = 0; round < 3; ++round)
   {
     const RKMMathTransformation shift(RKMMathVector(0, round, 0));
     ASSERT_EQ(set.ModifyTreePosition(round, &shift), S_OK);
     std::atomic<int> ready{0};
-    std::vector<RKMBVHTree *> got(kThreads, nullptr);
+    std::vector<TreeRef> got(kThreads);
     std::vector<std::thread> threads;
     for (int i = 0; i < kThreads; ++i)
       threads.emplace_back([&, i] {
         ++ready;
         while (ready.load() < kThreads)
           std::this_thread::yield();
-        got[static_cast<size_t>(i)] = set.GetTree();
+        got[static_cast<size_t>(i)] = Adopt(set.GetTree());
       });
     for (std::thread &th : threads)
       th.join();
-    ASSERT_NE(got[0], nullptr);
-    for (RKMBVHTree *t : got)
-      EXPECT_EQ(t, got[0]);
+    ASSERT_NE(got[0].Get(), nullptr);
+    for (const TreeRef &t : got)
+      EXPECT_EQ(t.Get(), got[0].Get());
     EXPECT_EQ(got[0]->GetRefCount(), kThreads + 1);
     EXPECT_EQ(LeavesOf(got[0]).size(), 12u);
-    for (RKMBVHTree *t : got)
-      t->Release();
   }
 }

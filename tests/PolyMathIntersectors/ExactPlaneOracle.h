@@ -14,8 +14,10 @@
 #include <random>
 #include <sstream>
 #include <string>
+#include <type_traits>
 #include <vector>
 
+#include "RKMMathPoint.h"
 #include "RKMMathPoint2D.h"
 #include "RKMPolyExactArithmetic.h"
 #include "RKMPolyIntersectionPoint.h"
@@ -396,60 +398,98 @@ inline const char *LayoutName(Layout l)
   return names[static_cast<int>(l)];
 }
 
-class PointSource
+// Points of dimension D from the small grid 0 … k through the case's affine map. The lattice and
+// extreme maps differ by dimension: entries up to 40 in the plane and 20 in space, and powers of
+// two chosen so that products of coordinates underflow or overflow.
+template <int D>
+class GridPointSource
 {
 public:
-  PointSource(std::uint64_t seed, Layout layout, int k) : m_rng(seed), m_layout(layout), m_k(k) {}
+  using Point = std::conditional_t<D == 2, RKMMathPoint2D, RKMMathPoint>;
+
+  GridPointSource(std::uint64_t seed, Layout layout, int k) : m_rng(seed), m_layout(layout), m_k(k)
+  {
+    for (int i = 0; i < D; ++i)
+      m_m[i * (D + 1)] = 1.0;
+  }
 
   // A fresh map for the next case.
   void NewCase()
   {
     if (m_layout == Layout::Lattice)
     {
-      std::uniform_int_distribution<int> m(-40, 40), o(-32000, 32000);
+      // An integer matrix keeps collinearity and coplanarity; the offset is a multiple of the
+      // default grid step, so Gridded data stay on the grid.
+      std::uniform_int_distribution<int> m(D == 2 ? -40 : -20, D == 2 ? 40 : 20), o(-32000, 32000);
       do
       {
         for (double &v : m_m)
           v = m(m_rng);
-      } while (m_m[0] * m_m[3] - m_m[1] * m_m[2] == 0);
-      m_o[0] = o(m_rng) / 32.0;
-      m_o[1] = o(m_rng) / 32.0;
+      } while (Det() == 0);
+      for (double &v : m_o)
+        v = o(m_rng) / 32.0;
     }
     else if (m_layout == Layout::Skewed)
     {
       std::uniform_real_distribution<double> m(-3.0, 3.0), o(-1000.0, 1000.0);
       for (double &v : m_m)
         v = m(m_rng);
-      m_o[0] = o(m_rng);
-      m_o[1] = o(m_rng);
+      for (double &v : m_o)
+        v = o(m_rng);
     }
     else if (m_layout == Layout::Extreme)
     {
-      static const int kExponents[] = {-1060, -700, -540, 520, 700, 1000};
-      const double s = std::ldexp(1.0, kExponents[m_rng() % 6]);
-      m_m[0] = m_m[3] = s;
-      m_m[1] = m_m[2] = 0;
+      static const int kPlane[] = {-1060, -700, -540, 520, 700, 1000};
+      static const int kSpace[] = {-1060, -700, -540, -340, 340, 520, 700, 1000};
+      const double s = D == 2 ? std::ldexp(1.0, kPlane[m_rng() % 6]) : std::ldexp(1.0, kSpace[m_rng() % 8]);
+      for (int i = 0; i < D * D; ++i)
+        m_m[i] = i % (D + 1) == 0 ? s : 0.0;
+      for (double &v : m_o)
+        v = 0.0;
     }
   }
 
-  RKMMathPoint2D Next()
+  Point Next()
   {
     std::uniform_int_distribution<int> g(0, m_k);
-    const double i = g(m_rng), j = g(m_rng);
-    if (m_layout == Layout::SmallGrid)
-      return {i, j};
-    return {m_o[0] + m_m[0] * i + m_m[1] * j, m_o[1] + m_m[2] * i + m_m[3] * j};
+    double u[D], x[D];
+    for (double &v : u)
+      v = g(m_rng);
+    for (int r = 0; r < D; ++r)
+    {
+      x[r] = u[r];
+      if (m_layout != Layout::SmallGrid)
+      {
+        x[r] = m_o[r] + m_m[r * D] * u[0] + m_m[r * D + 1] * u[1];
+        if (D == 3)
+          x[r] += m_m[r * D + 2] * u[2];
+      }
+    }
+    if constexpr (D == 2)
+      return {x[0], x[1]};
+    else
+      return {x[0], x[1], x[2]};
   }
 
   std::mt19937_64 &Rng() { return m_rng; }
 
 private:
+  double Det() const
+  {
+    if (D == 2)
+      return m_m[0] * m_m[3] - m_m[1] * m_m[2];
+    return m_m[0] * (m_m[4] * m_m[8] - m_m[5] * m_m[7]) - m_m[1] * (m_m[3] * m_m[8] - m_m[5] * m_m[6]) +
+           m_m[2] * (m_m[3] * m_m[7] - m_m[4] * m_m[6]);
+  }
+
   std::mt19937_64 m_rng;
   Layout m_layout;
   int m_k;
-  double m_m[4] = {1, 0, 0, 1};
-  double m_o[2] = {0, 0};
+  double m_m[D * D] = {};
+  double m_o[D] = {};
 };
+
+using PointSource = GridPointSource<2>;
 
 // One randomized sweep: the mode, where the points come from, the grid size, how many cases and
 // the seed that reproduces them.

@@ -343,68 +343,6 @@ inline SegmentAnswer IntersectSegment(const Q3 t[3], const Q3 &p, const Q3 &q)
 // shared vertices, coplanar pairs, edges in planes and vertices on edges stay frequent.
 using oracle::Layout;
 
-class PointSource
-{
-public:
-  PointSource(std::uint64_t seed, Layout layout, int k) : m_rng(seed), m_layout(layout), m_k(k) {}
-
-  void NewCase()
-  {
-    if (m_layout == Layout::Lattice)
-    {
-      // An integer matrix keeps collinearity and coplanarity; the offset is a multiple of the
-      // default grid step, so Gridded data stay on the grid.
-      std::uniform_int_distribution<int> m(-20, 20), o(-32000, 32000);
-      do
-      {
-        for (double &v : m_m)
-          v = m(m_rng);
-      } while (Det() == 0);
-      for (double &v : m_o)
-        v = o(m_rng) / 32.0;
-    }
-    else if (m_layout == Layout::Skewed)
-    {
-      std::uniform_real_distribution<double> m(-3.0, 3.0), o(-1000.0, 1000.0);
-      for (double &v : m_m)
-        v = m(m_rng);
-      for (double &v : m_o)
-        v = o(m_rng);
-    }
-    else if (m_layout == Layout::Extreme)
-    {
-      static const int kExponents[] = {-1060, -700, -540, -340, 340, 520, 700, 1000};
-      const double s = std::ldexp(1.0, kExponents[m_rng() % 8]);
-      for (int i = 0; i < 9; ++i)
-        m_m[i] = i % 4 == 0 ? s : 0.0;
-      m_o[0] = m_o[1] = m_o[2] = 0.0;
-    }
-  }
-
-  RKMMathPoint Next()
-  {
-    std::uniform_int_distribution<int> g(0, m_k);
-    const double i = g(m_rng), j = g(m_rng), l = g(m_rng);
-    if (m_layout == Layout::SmallGrid)
-      return {i, j, l};
-    return {m_o[0] + m_m[0] * i + m_m[1] * j + m_m[2] * l, m_o[1] + m_m[3] * i + m_m[4] * j + m_m[5] * l,
-            m_o[2] + m_m[6] * i + m_m[7] * j + m_m[8] * l};
-  }
-
-  std::mt19937_64 &Rng() { return m_rng; }
-
-private:
-  double Det() const
-  {
-    return m_m[0] * (m_m[4] * m_m[8] - m_m[5] * m_m[7]) - m_m[1] * (m_m[3] * m_m[8] - m_m[5] * m_m[6]) +
-           m_m[2] * (m_m[3] * m_m[7] - m_m[4] * m_m[6]);
-  }
-
-  std::mt19937_64 m_rng;
-  Layout m_layout;
-  int m_k;
-  double m_m[9] = {1, 0, 0, 0, 1, 0, 0, 0, 1};
-  double m_o[3] = {0, 0, 0};
-};
+using PointSource = oracle::GridPointSource<3>;
 
 } // namespace space

@@ -2,6 +2,7 @@
 #include "RKMPolyAtomicOperations.h"
 #include "RKMPolyScopedMutex.h"
 #include "RKMPolySpinLockMutex.h"
+#include "RKMRef.h"
 #include "RKMRefCounted.h"
 
 #include "RuntimeTestSupport.h"
@@ -10,6 +11,7 @@
 
 #include <atomic>
 #include <climits>
+#include <utility>
 #include <vector>
 
 namespace
@@ -52,6 +54,46 @@ TEST(RKMRefCounted, CountsCopiesAndAssignment)
   EXPECT_EQ(deaths.load(), 2);
   EXPECT_EQ(a->Release(), 0);
   EXPECT_EQ(deaths.load(), 3);
+}
+
+// Each holder owns exactly one reference: Adopt takes the caller's, Share and copies add one, moves
+// pass it on, and the object dies once, with the last reference.
+TEST(RKMRef, HoldsOneReferenceEach)
+{
+  std::atomic<int> deaths{0};
+  {
+    const RKMRef<Counted> a = RKMRef<Counted>::Adopt(new Counted(&deaths));
+    EXPECT_EQ(a->GetRefCount(), 1);
+    RKMRef<Counted> shared = RKMRef<Counted>::Share(a.Get()), copy(a);
+    EXPECT_EQ((*a).GetRefCount(), 3);
+    RKMRef<Counted> other = RKMRef<Counted>::Adopt(new Counted(&deaths));
+    other = copy;  // releases the other object, its only reference
+    EXPECT_EQ(deaths.load(), 1);
+    EXPECT_EQ(a->GetRefCount(), 4);
+    RKMRef<Counted> moved(std::move(copy));
+    other = std::move(shared);
+    EXPECT_TRUE(!copy && !shared && moved && other);
+    EXPECT_EQ(moved.Get(), a.Get());
+    EXPECT_EQ(a->GetRefCount(), 3);
+    const RKMRef<Counted> &alias = other;
+    other = alias;
+    EXPECT_EQ(other.Get(), a.Get());
+    EXPECT_EQ(a->GetRefCount(), 3);
+    other.Reset();
+    EXPECT_EQ(a->GetRefCount(), 2);
+    RKMRef<Counted> detached = moved;
+    Counted *raw = detached.Detach();
+    EXPECT_FALSE(detached);
+    EXPECT_EQ(raw->Release(), 2);
+
+    RKMRef<Counted> none, nullAdopted = RKMRef<Counted>::Adopt(nullptr), nullShared = RKMRef<Counted>::Share(nullptr);
+    EXPECT_TRUE(!none && !nullAdopted && !nullShared && none.Get() == nullptr && none.Detach() == nullptr);
+    none.Reset();
+    moved.Reset();
+    EXPECT_EQ(a->GetRefCount(), 1);
+    EXPECT_EQ(deaths.load(), 1);
+  }
+  EXPECT_EQ(deaths.load(), 2);
 }
 
 // Every thread owns one reference and churns extra ones; a lost increment deletes the object while

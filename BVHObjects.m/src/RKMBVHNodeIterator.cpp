@@ -1,0 +1,3 @@
+#include "RKMBVHNodeIterator.h"
+
+RKMBVHNodeIterator::~RKMBVHNodeIterator() = default;

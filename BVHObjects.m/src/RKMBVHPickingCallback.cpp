@@ -1,0 +1,3 @@
+#include "RKMBVHPickingCallback.h"
+
+RKMBVHPickingCallback::~RKMBVHPickingCallback() = default;

@@ -1,0 +1,3 @@
+#include "RKMBVHPickingOperator.h"
+
+HRESULT RKMBVHPickingOperator::Run(const RKMBVHTree &, const RKMMathPoint &, const RKMMathVector &) { return E_FAIL; }

@@ -1,0 +1,3 @@
+#include "RKMBVHTreeObserver.h"
+
+RKMBVHTreeObserver::~RKMBVHTreeObserver() = default;

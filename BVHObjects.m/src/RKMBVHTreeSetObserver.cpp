@@ -1,0 +1,3 @@
+#include "RKMBVHTreeSetObserver.h"
+
+RKMBVHTreeSetObserver::~RKMBVHTreeSetObserver() = default;

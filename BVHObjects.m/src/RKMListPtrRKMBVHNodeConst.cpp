@@ -1,0 +1,3 @@
+#include "RKMListPtrRKMBVHNodeConst.h"
+
+RKMListPtrRKMBVHNodeConst::~RKMListPtrRKMBVHNodeConst() = default;

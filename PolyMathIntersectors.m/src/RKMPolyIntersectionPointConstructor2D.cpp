@@ -1,0 +1,3 @@
+#include "RKMPolyIntersectionPointConstructor2D.h"
+
+RKMPolyIntersectionPointConstructor2D::~RKMPolyIntersectionPointConstructor2D() = default;

@@ -1,0 +1,3 @@
+#include "RKMPolyThreads.h"
+
+RKMPolyThreads::~RKMPolyThreads() { Join(); }
