@@ -45,23 +45,19 @@ struct Outcome
   std::vector<BenchContact> contacts;
 };
 
-bool Load(const std::string &path, InputMesh &out)
+bool Load(const std::string &path, Mesh &out)
 {
-  Mesh m;
   std::string error;
-  if (!ReadMesh(path, m, error))
+  if (!ReadMesh(path, out, error))
   {
     std::fprintf(stderr, "%s\n", error.c_str());
     return false;
   }
-  out.vertices = std::move(m.vertices);
-  out.triangles = std::move(m.triangles);
-  out.name = m.name;
   return true;
 }
 
 // Rotated by small angles about the mesh's box centre and moved by about 1% of its box diagonal.
-RKMMathTransformation NearCopy(const InputMesh &m, double rx, double ry, double rz, double fraction)
+RKMMathTransformation NearCopy(const Mesh &m, double rx, double ry, double rz, double fraction)
 {
   double lo[3] = {HUGE_VAL, HUGE_VAL, HUGE_VAL}, hi[3] = {-HUGE_VAL, -HUGE_VAL, -HUGE_VAL};
   for (const auto &v : m.vertices)
@@ -97,7 +93,7 @@ bool MakeScene(const std::string &dir, const std::string &name, Scene &s)
   s.name = name;
   if (name == "assembly")
   {
-    InputMesh bike, buildings;
+    Mesh bike, buildings;
     if (!Load(dir + "/motorBike.obj", bike) || !Load(dir + "/buildings.obj", buildings))
       return false;
     // Three bikes riding into each other, the middle one into a building's wall.
@@ -108,7 +104,7 @@ bool MakeScene(const std::string &dir, const std::string &name, Scene &s)
   }
   else
   {
-    InputMesh m;
+    Mesh m;
     if (!Load(dir + "/" + name, m))
       return false;
     s.meshes.push_back({m, RKMMathTransformation()});
@@ -192,7 +188,7 @@ Outcome InChild(const std::function<BenchPeerResult()> &method)
   return o;
 }
 
-BenchPeerResult Ours(const Scene &s, bool gridded, int strategy)
+BenchPeerResult Ours(const Scene &s, bool gridded, RKMBVHTreeBuilder::SpatialOptimization strategy)
 {
   ClashOptions options;
   options.gridded = gridded;
@@ -245,8 +241,8 @@ int main(int argc, char **argv)
       std::function<BenchPeerResult()> run;
     };
     std::vector<Method> methods = {
-        {"ours, grid builder, adaptive", [&] { return Ours(s, false, 1); }},
-        {"ours, grid builder, gridded", [&] { return Ours(s, true, 1); }},
+        {"ours, grid builder, adaptive", [&] { return Ours(s, false, RKMBVHTreeBuilder::Basic); }},
+        {"ours, grid builder, gridded", [&] { return Ours(s, true, RKMBVHTreeBuilder::Basic); }},
         {"CGAL box_intersection_d + do_intersect", [&] { return CgalClash(s.soups); }},
         {"FCL OBBRSS", [&] { return FclClash(s.soups, true); }},
         {"FCL AABB", [&] { return FclClash(s.soups, false); }},
@@ -254,7 +250,8 @@ int main(int argc, char **argv)
     // The greedy builder is quadratic in the triangles of a mesh (330 s for the armadillo's two
     // meshes of 52,000): only where that stays short.
     if (s.triangles <= 20000)
-      methods.insert(methods.begin() + 2, {"ours, greedy builder, adaptive", [&] { return Ours(s, false, 2); }});
+      methods.insert(methods.begin() + 2,
+                     {"ours, greedy builder, adaptive", [&] { return Ours(s, false, RKMBVHTreeBuilder::Best); }});
     std::vector<Outcome> outcomes;
     for (const Method &m : methods)
       outcomes.push_back(InChild(m.run));

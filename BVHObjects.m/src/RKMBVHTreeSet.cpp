@@ -365,8 +365,10 @@ void RKMBVHTreeSet::RebuildOverAllTree()
   {
     RKMBVHNodeConst *leaf = m_leaves[i];
     RKMBVHTreeSetAttribute *attribute = AttributeOf(leaf);
-    if (!leaf || !attribute || !(attribute->deactivated & 1))
-      active.Append(leaf);
+    // An overall tree that left an object out would hide its clashes: without memory for the list
+    // there is no overall tree at all, and GetTree says so with a null.
+    if ((!leaf || !attribute || !(attribute->deactivated & 1)) && !active.Append(leaf))
+      return;
   }
   if (active.Size() == 0)
     return;

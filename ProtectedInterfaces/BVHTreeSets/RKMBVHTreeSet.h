@@ -60,7 +60,8 @@ public:
   HRESULT ActivateAll();
 
   /// The overall tree with one reference added for the caller, rebuilt first when a change dropped it;
-  /// null when no object is active. Safe from several threads at once (it is built once).
+  /// null when no object is active, or when memory ran out while building it. Safe from several
+  /// threads at once (it is built once).
   RKMBVHTree *GetTree();
   /// The object tree of a leaf of a set (no reference added); null without attribute.
   static RKMBVHTree *GetTree(const RKMBVHNodeConst &leaf);

@@ -42,6 +42,10 @@ public:
   /// ε: half the grid step.
   double GetCoordinatePrecision() const { return m_precision; }
   Mode GetMode() const { return m_mode; }
+  /// 0 when memory ran out while the arithmetic was made: it then has no adaptive kernel, and every
+  /// sign that needs one (the Adaptive modes, InCircle) is 0. A caller that cannot tell such a 0 from
+  /// a degenerate case asks here first.
+  unsigned char IsValid() const { return m_kernel != nullptr; }
   /// M snapped in the Gridded mode, M itself otherwise.
   float GetMaxNormalizedCoord() const;
 

@@ -8,7 +8,6 @@
 #include <climits>
 #include <cstdio>
 #include <cstdlib>
-#include <string>
 
 #include <dlfcn.h>
 
@@ -47,14 +46,19 @@ void *RKMQNVDynamicFunction(const char *library, const char *symbol)
 {
   if (!library || !symbol || !*library || !*symbol)
     return nullptr;
-  const std::string name(library);
-  const std::string candidates[] = {"lib" + name + ".so", name + ".so", name};
-  for (const std::string &candidate : candidates)
+  // The candidate names are built in a fixed buffer: the lookup allocates nothing, so it cannot fail
+  // for want of memory (destructors call it), and a name too long for the buffer is simply not found.
+  static const char *const kForms[] = {"lib%s.so", "%s.so", "%s"};
+  for (const char *form : kForms)
   {
+    char candidate[512];
+    const int length = std::snprintf(candidate, sizeof candidate, form, library);
+    if (length < 0 || length >= static_cast<int>(sizeof candidate))
+      continue;
     // RTLD_NOLOAD first: a provider already in the process is found without a search of the disk.
-    void *handle = dlopen(candidate.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NOLOAD);
+    void *handle = dlopen(candidate, RTLD_NOW | RTLD_LOCAL | RTLD_NOLOAD);
     if (!handle)
-      handle = dlopen(candidate.c_str(), RTLD_NOW | RTLD_LOCAL);
+      handle = dlopen(candidate, RTLD_NOW | RTLD_LOCAL);
     if (!handle)
       continue;
     if (void *f = dlsym(handle, symbol))

@@ -1,14 +1,12 @@
-// Exact clash detection between triangle meshes: reads two or more meshes (OBJ, STL, OFF), places
+// Exact clash detection between triangle meshes: reads two or more meshes (OBJ, STL, OFF, PLY), places
 // each by an optional rigid motion, and reports for every pair of meshes the triangle pairs that
 // cross, that only touch, and that overlap in a common plane, with the intersection curves written
 // as OBJ polylines and an SVG picture. With no argument it runs on a built-in scene: a bunny against
-// a turned and shifted copy of itself.
+// a turned and shifted copy of itself. This file parses the arguments and prints; the pipeline is the
+// clash core's.
 
-#include <chrono>
-#include <cmath>
 #include <cstdio>
-#include <cstdlib>
-#include <cstring>
+#include <new>
 #include <string>
 #include <unistd.h>
 #include <vector>
@@ -26,14 +24,17 @@ void Usage(FILE *to)
 {
   std::fprintf(to,
                "usage: rkm_clash [options] [mesh [--place tx ty tz rx ry rz]]...\n"
-               "  Reports the exact contacts between every two of the meshes (OBJ, STL or OFF).\n"
+               "  Reports the exact contacts between every two of the meshes (OBJ, STL, OFF or PLY).\n"
                "  --place tx ty tz rx ry rz  moves the mesh before it: rotations in degrees about x, y, z,\n"
                "                             then the translation\n"
                "  --gridded                  decide on coordinates snapped to a common grid (default:\n"
                "                             on the placed coordinates as they are)\n"
                "  --strategy flat|grid|greedy  how the hierarchies are built (default grid)\n"
                "  --view x|y|z               the axis the picture is seen along (default z)\n"
-               "  --out PREFIX               output files PREFIX_curves.obj and PREFIX.svg (default clash)\n"
+               "  --out PREFIX               output files PREFIX_curves.obj and PREFIX.svg; PREFIX may\n"
+               "                             have folders, made when missing, and a folder alone (ending\n"
+               "                             with /) means PREFIX/clash (default: clash, in the current\n"
+               "                             folder)\n"
                "With no mesh, a built-in bunny is tested against a turned and shifted copy of itself.\n");
 }
 
@@ -62,34 +63,18 @@ private:
   bool m_shown = false;
 };
 
-bool ParseDouble(const char *s, double &v)
+int Fail(const std::string &error)
 {
-  char *end = nullptr;
-  v = std::strtod(s, &end);
-  return end && end != s && *end == '\0';
+  std::fprintf(stderr, "rkm_clash: %s\n", error.empty() ? "out of memory" : error.c_str());
+  return 1;
 }
 
-bool ToInput(const Mesh &in, InputMesh &out)
-{
-  out.vertices = in.vertices;
-  out.triangles = in.triangles;
-  out.name = in.name;
-  return true;
-}
-
-double Seconds(std::chrono::steady_clock::time_point since)
-{
-  return std::chrono::duration<double>(std::chrono::steady_clock::now() - since).count();
-}
-} // namespace
-
-int main(int argc, char **argv)
+int Run(int argc, char **argv)
 {
   ClashOptions options;
   int view = 2;
   std::string prefix = "clash";
-  std::vector<std::string> paths;
-  std::vector<RKMMathTransformation> placements;
+  std::vector<MeshFile> files;
   for (int i = 1; i < argc; ++i)
   {
     const std::string arg = argv[i];
@@ -104,25 +89,19 @@ int main(int argc, char **argv)
     {
       const std::string s = argv[++i];
       if (s == "flat")
-        options.strategy = 0;
+        options.strategy = RKMBVHTreeBuilder::NoOptim;
       else if (s == "grid")
-        options.strategy = 1;
+        options.strategy = RKMBVHTreeBuilder::Basic;
       else if (s == "greedy")
-        options.strategy = 2;
+        options.strategy = RKMBVHTreeBuilder::Best;
       else
-      {
-        std::fprintf(stderr, "rkm_clash: unknown strategy '%s'\n", s.c_str());
-        return 1;
-      }
+        return Fail("unknown strategy '" + s + "'");
     }
     else if (arg == "--view" && i + 1 < argc)
     {
       const std::string s = argv[++i];
       if (s != "x" && s != "y" && s != "z")
-      {
-        std::fprintf(stderr, "rkm_clash: --view takes x, y or z\n");
-        return 1;
-      }
+        return Fail("--view takes x, y or z");
       view = s[0] - 'x';
     }
     else if (arg == "--out" && i + 1 < argc)
@@ -130,88 +109,40 @@ int main(int argc, char **argv)
     else if (arg == "--place")
     {
       double v[6];
-      if (paths.empty() || i + 6 >= argc)
-      {
-        std::fprintf(stderr, "rkm_clash: --place follows a mesh and takes six numbers\n");
-        return 1;
-      }
+      if (files.empty() || i + 6 >= argc)
+        return Fail("--place follows a mesh and takes six numbers");
       for (int k = 0; k < 6; ++k)
-        if (!ParseDouble(argv[i + 1 + k], v[k]) || !std::isfinite(v[k]))
-        {
-          std::fprintf(stderr, "rkm_clash: --place: '%s' is not a number\n", argv[i + 1 + k]);
-          return 1;
-        }
+        if (!ParseFiniteNumber(argv[i + 1 + k], v[k]))
+          return Fail("--place: '" + std::string(argv[i + 1 + k]) + "' is not a number");
       i += 6;
-      placements.back() = MakePlacement(v[0], v[1], v[2], v[3], v[4], v[5]);
+      files.back().placement = MakePlacement(v[0], v[1], v[2], v[3], v[4], v[5]);
     }
     else if (!arg.empty() && arg[0] == '-')
     {
-      std::fprintf(stderr, "rkm_clash: unknown option '%s'\n", arg.c_str());
+      Fail("unknown option '" + arg + "'");
       Usage(stderr);
       return 1;
     }
     else
-    {
-      paths.push_back(arg);
-      placements.emplace_back();
-    }
+      files.push_back({arg, RKMMathTransformation()});
   }
 
   ProgressLine progress;
   std::vector<PlacedMesh> meshes;
-  const auto readStart = std::chrono::steady_clock::now();
-  if (paths.empty())
-  {
-    Mesh bunny;
-    std::string error;
-    if (!ReadMeshFromMemory(kEmbeddedBunnyObj, "obj", "bunny (built in)", bunny, error))
-    {
-      std::fprintf(stderr, "rkm_clash: %s\n", error.c_str());
-      return 1;
-    }
-    PlacedMesh a, b;
-    ToInput(bunny, a.mesh);
-    ToInput(bunny, b.mesh);
-    b.mesh.name = "bunny, turned and shifted";
-    b.placement = MakePlacement(0.9, 0.4, 0.3, 8.0, 25.0, 4.0);
-    meshes.push_back(std::move(a));
-    meshes.push_back(std::move(b));
-  }
-  else
-    for (size_t i = 0; i < paths.size(); ++i)
-    {
-      Mesh m;
-      std::string error;
-      const bool ok =
-          ReadMesh(paths[i], m, error, [&](double f) { progress.Show("reading " + paths[i], f); });
-      progress.Clear();
-      if (!ok)
-      {
-        std::fprintf(stderr, "rkm_clash: %s\n", error.c_str());
-        return 1;
-      }
-      PlacedMesh p;
-      ToInput(m, p.mesh);
-      p.placement = placements[i];
-      meshes.push_back(std::move(p));
-    }
-  const double readSeconds = Seconds(readStart);
-  if (meshes.size() < 2)
-  {
-    std::fprintf(stderr, "rkm_clash: give at least two meshes (or none for the built-in scene)\n");
-    return 1;
-  }
+  double readSeconds = 0.0;
+  std::string error;
+  const bool read = LoadScene(files, kEmbeddedBunnyObj, meshes, readSeconds, error,
+                              [&](const std::string &path, double f) { progress.Show("reading " + path, f); });
+  progress.Clear();
+  if (!read)
+    return Fail(error);
 
   options.progress = [&](const char *phase, double f) { progress.Show(phase, f); };
   ClashReport report;
-  std::string error;
-  const bool ok = FindClashes(meshes, options, report, error);
+  const bool found = FindClashes(meshes, options, report, error);
   progress.Clear();
-  if (!ok)
-  {
-    std::fprintf(stderr, "rkm_clash: %s\n", error.c_str());
-    return 1;
-  }
+  if (!found)
+    return Fail(error);
 
   std::printf("%zu meshes:", meshes.size());
   for (const PlacedMesh &m : meshes)
@@ -232,13 +163,31 @@ int main(int argc, char **argv)
                 meshes[static_cast<size_t>(p.object[0])].mesh.name.c_str(),
                 meshes[static_cast<size_t>(p.object[1])].mesh.name.c_str(), p.crossing, p.touching, p.coplanar);
 
-  const std::string objPath = prefix + "_curves.obj", svgPath = prefix + ".svg";
-  if (!WriteCurvesObj(objPath, report, error) || !WriteSvg(svgPath, meshes, report, view, error))
+  const OutputFiles out = OutputFilesFor(prefix);
+  if (!WriteOutputs(out, meshes, report, view, error))
   {
-    std::fprintf(stderr, "rkm_clash: %s\n", error.c_str());
-    return 2;
+    // Running out of memory ends with 1, as in every other phase; a file that cannot be written with 2.
+    const bool memory = error.empty() || error.rfind("out of memory", 0) == 0;
+    Fail(error);
+    return memory ? 1 : 2;
   }
-  std::printf("wrote %s (intersection curves) and %s (picture seen along %c)\n", objPath.c_str(), svgPath.c_str(),
-              'x' + view);
+  std::printf("wrote %s (intersection curves) and %s (picture seen along %c)\n", out.curves.c_str(),
+              out.picture.c_str(), 'x' + view);
   return 0;
+}
+} // namespace
+
+int main(int argc, char **argv)
+{
+  // The core reports running out of memory as a failure; what is left is this file's own strings.
+  try
+  {
+    if (!ReserveMemoryForFailures())
+      return Fail(std::string());
+    return Run(argc, argv);
+  }
+  catch (const std::bad_alloc &)
+  {
+    return Fail(std::string());
+  }
 }

@@ -1,3 +1,6 @@
+// The clash pipeline's tests: small scenes whose contacts are known, and the bunny against the
+// brute-force reference.
+
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -14,17 +17,17 @@ namespace
 {
 using namespace rkmclash;
 
-InputMesh Tetrahedron(const std::array<double, 3> &a, const std::array<double, 3> &b, const std::array<double, 3> &c,
-                      const std::array<double, 3> &d, const std::string &name)
+Mesh Tetrahedron(const std::array<double, 3> &a, const std::array<double, 3> &b, const std::array<double, 3> &c,
+                 const std::array<double, 3> &d, const std::string &name)
 {
-  InputMesh m;
+  Mesh m;
   m.vertices = {a, b, c, d};
   m.triangles = {{0, 2, 1}, {0, 1, 3}, {1, 2, 3}, {2, 0, 3}};
   m.name = name;
   return m;
 }
 
-PlacedMesh Placed(const InputMesh &m, const RKMMathTransformation &t = RKMMathTransformation())
+PlacedMesh Placed(const Mesh &m, const RKMMathTransformation &t = RKMMathTransformation())
 {
   PlacedMesh p;
   p.mesh = m;
@@ -56,16 +59,12 @@ Totals RunScene(const std::vector<PlacedMesh> &meshes, bool gridded, ClashReport
   return t;
 }
 
-InputMesh Bunny()
+Mesh Bunny()
 {
   Mesh m;
   std::string error;
   EXPECT_TRUE(ReadMesh(RKM_CLASH_BUNNY_PATH, m, error)) << error;
-  InputMesh in;
-  in.vertices = m.vertices;
-  in.triangles = m.triangles;
-  in.name = "bunny";
-  return in;
+  return m;
 }
 
 using PairKey = std::tuple<int, int, int>;
@@ -83,8 +82,8 @@ std::set<PairKey> Keys(const ObjectPairReport &p)
 // cross that face, and nothing else meets.
 TEST(RKMClash, TetrahedronPokingThroughAFace)
 {
-  const InputMesh t1 = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "corner");
-  const InputMesh t2 = Tetrahedron({1, 1, 1}, {5, 2, 2}, {2, 5, 2}, {2, 2, 5}, "spike");
+  const Mesh t1 = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "corner");
+  const Mesh t2 = Tetrahedron({1, 1, 1}, {5, 2, 2}, {2, 5, 2}, {2, 2, 5}, "spike");
   for (bool gridded : {false, true})
   {
     ClashReport report;
@@ -103,7 +102,7 @@ TEST(RKMClash, TetrahedronPokingThroughAFace)
 
 TEST(RKMClash, FarApartMeshesDoNotMeet)
 {
-  const InputMesh bunny = Bunny();
+  const Mesh bunny = Bunny();
   for (bool gridded : {false, true})
   {
     ClashReport report;
@@ -117,7 +116,7 @@ TEST(RKMClash, FarApartMeshesDoNotMeet)
 // only touch it, and nothing crosses.
 TEST(RKMClash, MeshAgainstItselfOnlyTouches)
 {
-  const InputMesh t = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "tetra");
+  const Mesh t = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "tetra");
   for (bool gridded : {false, true})
   {
     const Totals totals = RunScene({Placed(t), Placed(t)}, gridded);
@@ -130,11 +129,11 @@ TEST(RKMClash, MeshAgainstItselfOnlyTouches)
 
 TEST(RKMClash, OverlappingCoplanarSquares)
 {
-  InputMesh a;
+  Mesh a;
   a.vertices = {{0, 0, 0}, {2, 0, 0}, {2, 2, 0}, {0, 2, 0}};
   a.triangles = {{0, 1, 2}, {0, 2, 3}};
   a.name = "a";
-  InputMesh b = a;
+  Mesh b = a;
   b.name = "b";
   for (bool gridded : {false, true})
   {
@@ -149,7 +148,7 @@ TEST(RKMClash, OverlappingCoplanarSquares)
 // The hierarchy walk finds exactly the contacts that testing every pair of triangles finds.
 TEST(RKMClash, BunnySceneMatchesBruteForce)
 {
-  const InputMesh bunny = Bunny();
+  const Mesh bunny = Bunny();
   ASSERT_EQ(bunny.triangles.size(), 3674u);
   const std::vector<PlacedMesh> meshes = {Placed(bunny), Placed(bunny, MakePlacement(0.9, 0.4, 0.3, 8.0, 25.0, 4.0))};
   for (bool gridded : {false, true})
@@ -166,15 +165,15 @@ TEST(RKMClash, BunnySceneMatchesBruteForce)
 
 TEST(RKMClash, BadInputIsRefused)
 {
-  const InputMesh t = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "tetra");
+  const Mesh t = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "tetra");
   ClashReport report;
   std::string error;
   EXPECT_FALSE(FindClashes({Placed(t)}, ClashOptions(), report, error));
-  InputMesh bad = t;
+  Mesh bad = t;
   bad.triangles.push_back({0, 1, 7});
   EXPECT_FALSE(FindClashes({Placed(t), Placed(bad)}, ClashOptions(), report, error));
   EXPECT_NE(error.find("tetra"), std::string::npos) << error;
-  InputMesh nan = t;
+  Mesh nan = t;
   nan.vertices[2][1] = std::nan("");
   EXPECT_FALSE(FindClashes({Placed(t), Placed(nan)}, ClashOptions(), report, error));
   EXPECT_NE(error.find("not finite"), std::string::npos) << error;

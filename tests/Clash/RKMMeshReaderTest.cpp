@@ -1,3 +1,6 @@
+// The mesh readers' tests: good and damaged files of every format, with the generators that make them
+// (binary STL, PLY in its three encodings) and a fixture that writes them to a folder of their own.
+
 #include "RKMMeshReader.h"
 
 #include <gtest/gtest.h>
@@ -12,6 +15,7 @@
 #include <limits>
 #include <new>
 #include <random>
+#include <cstdlib>
 #include <sstream>
 #include <stdexcept>
 #include <string>
@@ -122,6 +126,79 @@ const char *const kOff = "OFF\n"
                          "0 0 1\n1 0 1\n1 1 1\n0 1 1\n"
                          "4 0 3 2 1\n4 4 5 6 7\n4 0 1 5 4\n"
                          "4 1 2 6 5\n4 2 3 7 6\n4 3 0 4 7 255 0 0\n";
+
+// A PLY file in one of the three encodings: "ply", the format line, `header`, "end_header", then one
+// element instance per row, each value written as the PLY type it is tagged with.
+using PlyRow = std::vector<std::pair<std::string, double>>;
+
+std::string Ply(const std::string &format, const std::string &header, const std::vector<PlyRow> &rows)
+{
+  std::string out = "ply\nformat " + format + " 1.0\n" + header + "end_header\n";
+  for (const PlyRow &row : rows)
+  {
+    for (const auto &[type, value] : row)
+    {
+      if (format == "ascii")
+      {
+        std::ostringstream text;
+        text << value << ' ';
+        out += text.str();
+        continue;
+      }
+      std::uint64_t bits = 0;
+      std::size_t size = type == "char" || type == "uchar" ? 1 : type == "short" || type == "ushort" ? 2 : 4;
+      if (type != "float" && type != "double")
+        bits = static_cast<std::uint64_t>(static_cast<std::int64_t>(value));
+      else if (type == "float")
+      {
+        const float f = static_cast<float>(value);
+        std::uint32_t narrow;
+        std::memcpy(&narrow, &f, sizeof f);
+        bits = narrow;
+      }
+      else
+      {
+        std::memcpy(&bits, &value, sizeof bits);
+        size = 8;
+      }
+      for (std::size_t k = 0; k < size; ++k)
+        out += static_cast<char>(bits >> (8 * (format == "binary_big_endian" ? size - 1 - k : k)));
+    }
+    if (format == "ascii")
+      out += "\n";
+  }
+  return out;
+}
+
+// Every numeric type, both spellings, and what the mesh does not keep: other properties, lists and
+// elements, comments and obj_info.
+const char *const kPlyHeader = "comment made by hand\n"
+                               "obj_info a quad and a triangle\n"
+                               "element vertex 4\n"
+                               "property float x\n"
+                               "property float64 y\n"
+                               "property short z\n"
+                               "property uchar red\n"
+                               "element edge 1\n"
+                               "property int vertex1\n"
+                               "property int32 vertex2\n"
+                               "element face 2\n"
+                               "property list uint8 uint32 vertex_index\n"
+                               "property list ushort float texcoord\n"
+                               "property char flags\n"
+                               "element material 1\n"
+                               "property double shininess\n";
+
+const std::vector<PlyRow> kPlyRows = {
+    {{"float", 0}, {"double", 0}, {"short", 0}, {"uchar", 255}},
+    {{"float", 1}, {"double", 0}, {"short", 0}, {"uchar", 0}},
+    {{"float", 1}, {"double", 1.5}, {"short", 0}, {"uchar", 0}},
+    {{"float", 0.25}, {"double", 1}, {"short", -2}, {"uchar", 7}},
+    {{"int", 0}, {"int", 1}},
+    {{"uchar", 4}, {"uint", 0}, {"uint", 1}, {"uint", 2}, {"uint", 3}, {"ushort", 2}, {"float", 0.5}, {"float", 0},
+     {"char", -1}},
+    {{"uchar", 3}, {"uint", 3}, {"uint", 1}, {"uint", 0}, {"ushort", 0}, {"char", 0}},
+    {{"double", 0.5}}};
 
 class RKMMeshReader : public ::testing::Test
 {
@@ -361,7 +438,7 @@ TEST_F(RKMMeshReader, MissingFileDirectoryAndUnknownExtension)
   EXPECT_CONTAINS(FailPath(Path("absent.obj")), "cannot open file");
   fs::create_directories(m_dir / "folder.stl");
   EXPECT_CONTAINS(FailPath(Path("folder.stl")), "is a directory");
-  EXPECT_CONTAINS(Fail("mesh.ply", "ply\n"), "unknown mesh file extension '.ply'");
+  EXPECT_CONTAINS(Fail("mesh.3ds", "3ds\n"), "unknown mesh file extension '.3ds'");
   EXPECT_CONTAINS(Fail("mesh", "v 0 0 0\n"), "has no file extension");
 }
 
@@ -382,8 +459,8 @@ TEST_F(RKMMeshReader, MemoryReadsNameTheGivenNameAndCheckTheHint)
   std::string error;
   EXPECT_FALSE(rkmclash::ReadMeshFromMemory("v 0 0 0\nf 1 1 x\n", "OBJ", "embedded.obj", mesh, error));
   EXPECT_EQ(error, "embedded.obj:2: malformed face vertex 'x' (expected i, i/j, i//k or i/j/k)");
-  EXPECT_FALSE(rkmclash::ReadMeshFromMemory("v 0 0 0\n", "ply", "embedded", mesh, error));
-  EXPECT_CONTAINS(error, "embedded: unknown mesh format 'ply'");
+  EXPECT_FALSE(rkmclash::ReadMeshFromMemory("v 0 0 0\n", "3ds", "embedded", mesh, error));
+  EXPECT_CONTAINS(error, "embedded: unknown mesh format '3ds'");
   EXPECT_TRUE(rkmclash::ReadMeshFromMemory(BinaryStl(kTwoTriangles), ".stl", "memory.stl", mesh, error)) << error;
   EXPECT_EQ(mesh.triangles.size(), 2u);
 }
@@ -396,7 +473,7 @@ TEST_F(RKMMeshReader, ProgressCallbackFailuresBecomeErrors)
   EXPECT_FALSE(rkmclash::ReadMesh(path, mesh, error, [](double) { throw std::runtime_error("cancelled"); }));
   EXPECT_EQ(error, path + ": cancelled");
   EXPECT_FALSE(rkmclash::ReadMesh(path, mesh, error, [](double) { throw std::bad_alloc(); }));
-  EXPECT_EQ(error, path + ": out of memory while reading the mesh");
+  EXPECT_EQ(error, "out of memory while reading " + path);
   EXPECT_FALSE(rkmclash::ReadMesh(path, mesh, error, [](double) { throw 42; }));
   EXPECT_CONTAINS(error, "unexpected error");
   EXPECT_TRUE(mesh.triangles.empty());
@@ -574,6 +651,149 @@ TEST_F(RKMMeshReader, OffVerticesAndFaces)
                   "noverts.off:3: face index 0 out of range (no vertices");
 }
 
+// --- PLY ---
+
+TEST_F(RKMMeshReader, PlyGivesTheSameMeshInItsThreeEncodings)
+{
+  for (const std::string format : {"ascii", "binary_little_endian", "binary_big_endian"})
+  {
+    SCOPED_TRACE(format);
+    const Mesh mesh = Load("quad.ply", Ply(format, kPlyHeader, kPlyRows));
+    EXPECT_EQ(mesh.name, "quad");
+    EXPECT_EQ(mesh.vertices, (std::vector<std::array<double, 3>>{{0, 0, 0}, {1, 0, 0}, {1, 1.5, 0}, {0.25, 1, -2}}));
+    ExpectTriangles(mesh, {{0, 1, 2}, {0, 2, 3}, {3, 1, 0}});
+  }
+  // The other name of the index list, in a text file with CRLF line ends.
+  std::string header = kPlyHeader;
+  header.replace(header.find("uint8 uint32 vertex_index"), 25, "uchar int vertex_indices");
+  std::string text;
+  for (const char c : Ply("ascii", header, kPlyRows))
+    text += c == '\n' ? std::string("\r\n") : std::string(1, c);
+  ExpectTriangles(Load("crlf.PLY", text), {{0, 1, 2}, {0, 2, 3}, {3, 1, 0}});
+}
+
+TEST_F(RKMMeshReader, PlyBadHeaders)
+{
+  const std::string vertex = "element vertex 3\nproperty float x\nproperty float y\nproperty float z\n";
+  const std::string face = "element face 1\nproperty list uchar int vertex_indices\n";
+  const std::string body = "0 0 0\n1 0 0\n0 1 0\n3 0 1 2\n";
+  const auto ascii = [&](const std::string &h) { return "ply\nformat ascii 1.0\n" + h + "end_header\n" + body; };
+  EXPECT_CONTAINS(Fail("a.ply", ""), "a.ply: file is empty");
+  EXPECT_CONTAINS(Fail("a.ply", "solid x\n"), "a.ply:1: not a PLY file");
+  EXPECT_CONTAINS(Fail("a.ply", "ply\nformat ascii 2.0\n"), "a.ply:2: unsupported PLY version '2.0'");
+  EXPECT_CONTAINS(Fail("a.ply", "ply\nformat binary_middle_endian 1.0\n"), "a.ply:2: unknown PLY format");
+  EXPECT_CONTAINS(Fail("a.ply", "ply\n" + vertex), "a.ply:2: expected the 'format' line, found 'element'");
+  EXPECT_CONTAINS(Fail("a.ply", "ply\nformat ascii 1.0\n" + vertex), "a.ply:6: file ends before 'end_header'");
+  EXPECT_CONTAINS(Fail("a.ply", ascii("property float x\n")), "a.ply:3: unexpected header line 'property' before");
+  EXPECT_CONTAINS(Fail("a.ply", ascii("elemnt vertex 3\n")), "a.ply:3: unexpected header line 'elemnt'");
+  EXPECT_CONTAINS(Fail("a.ply", ascii("element vertex -3\n")), "a.ply:3: malformed element count '-3'");
+  EXPECT_CONTAINS(Fail("a.ply", ascii("element vertex 99999999999999999999\n")), "a.ply:3: element count");
+  EXPECT_CONTAINS(Fail("a.ply", ascii("element vertex 3\nproperty float16 x\n")), "a.ply:4: unknown property type");
+  EXPECT_CONTAINS(Fail("a.ply", ascii(vertex + "element face 1\nproperty list float int vertex_indices\n")),
+                  "a.ply:8: a list count needs an integer type");
+  EXPECT_CONTAINS(Fail("a.ply", ascii(vertex + "property float x\n" + face)), "a.ply:7: element 'vertex' has a second");
+  EXPECT_CONTAINS(Fail("a.ply", ascii("element vertex 3\nproperty float x\nproperty float y\n" + face)),
+                  "a.ply:3: element 'vertex' has no property 'z'");
+  EXPECT_CONTAINS(Fail("a.ply", ascii(vertex + "element face 1\nproperty list uchar float vertex_indices\n")),
+                  "a.ply:8: face property 'vertex_indices' must be a list of integers");
+  EXPECT_CONTAINS(Fail("a.ply", ascii(vertex + "element face 1\nproperty int flags\n")),
+                  "a.ply:7: element 'face' has no 'vertex_indices' list");
+  EXPECT_CONTAINS(Fail("a.ply", ascii(vertex)), "a.ply:7: no triangles");
+  EXPECT_CONTAINS(Fail("a.ply", ascii(vertex + "element face 0\nproperty list uchar int vertex_indices\n")),
+                  "a.ply:7: no triangles: the file declares 0 faces");
+  // Counts are checked against the bytes that follow before anything is allocated.
+  std::string header = vertex + face;
+  header.replace(header.find("face 1"), 6, "face 4000000000");
+  EXPECT_CONTAINS(Fail("a.ply", ascii(header)), "a.ply:7: element 'face' declares 4000000000 items, more than");
+}
+
+TEST_F(RKMMeshReader, PlyBadBodiesNameTheLineOrTheByte)
+{
+  const std::string head = "ply\nformat ascii 1.0\nelement vertex 3\nproperty float x\nproperty float y\n"
+                           "property float z\nproperty uchar red\nelement face 1\n"
+                           "property list uchar int vertex_indices\nend_header\n";
+  const std::string vertices = "0 0 0 1\n1 0 0 1\n0 1 0 1\n";
+  EXPECT_CONTAINS(Fail("a.ply", head + vertices + "3 0 1 3\n"), "a.ply:14: face index 3 out of range (0..2)");
+  EXPECT_CONTAINS(Fail("a.ply", head + vertices + "3 0 1 -1\n"), "a.ply:14: face index -1 out of range");
+  EXPECT_CONTAINS(Fail("a.ply", head + vertices + "2 0 1\n"), "a.ply:14: face with fewer than 3 vertices (2)");
+  EXPECT_CONTAINS(Fail("a.ply", head + vertices + "4 0 1 2\n"), "a.ply:14: list 'vertex_indices' declares 4 values");
+  EXPECT_CONTAINS(Fail("a.ply", head + vertices + "3 0 1 2 7\n"), "a.ply:14: the line has 5 values");
+  EXPECT_CONTAINS(Fail("a.ply", head + vertices), "a.ply:13: file ends after 0 of 1 'face' elements");
+  EXPECT_CONTAINS(Fail("a.ply", head + "0 0 0\n" + vertices + "3 0 1 2\n"), "a.ply:11: too few values");
+  EXPECT_CONTAINS(Fail("a.ply", head + "0 0 0 300\n"), "a.ply:11: value '300' is out of the range of type 'uchar'");
+  EXPECT_CONTAINS(Fail("a.ply", head + "0 0 x 1\n"), "a.ply:11: malformed number 'x'");
+  EXPECT_CONTAINS(Fail("a.ply", head + "0 nan 0 1\n"), "a.ply:11: coordinate 'nan' is not a finite number");
+
+  std::vector<PlyRow> rows = kPlyRows;
+  rows[6][3].second = 4;
+  EXPECT_CONTAINS(Fail("a.ply", Ply("binary_little_endian", kPlyHeader, rows)),
+                  "a.ply: face 2 (byte offset 499): face index 4 out of range (0..3)");
+  rows = kPlyRows;
+  rows[1][0].second = std::numeric_limits<double>::infinity();
+  EXPECT_CONTAINS(Fail("a.ply", Ply("binary_big_endian", kPlyHeader, rows)),
+                  "a.ply: vertex 2 (byte offset 415): a coordinate is not a finite number");
+  // Cut anywhere, the file never reads, and never reads out of bounds.
+  const std::string whole = Ply("binary_little_endian", kPlyHeader, kPlyRows);
+  for (std::size_t size = 0; size < whole.size(); ++size)
+  {
+    Mesh mesh;
+    std::string error;
+    ASSERT_FALSE(rkmclash::ReadMeshFromMemory(whole.substr(0, size), "ply", "cut.ply", mesh, error)) << size;
+    ASSERT_EQ(error.rfind("cut.ply", 0), 0u) << error;
+  }
+}
+
+// --- numbers ---
+
+// A number below the smallest subnormal reads as zero, as strtod reads it, in every text format and in
+// --place; only a number above the largest double is refused.
+TEST_F(RKMMeshReader, UnderflowReadsAsTheNearestDoubleAndOverflowFails)
+{
+  const std::string ply = "ply\nformat ascii 1.0\nelement vertex 3\nproperty double x\nproperty double y\n"
+                          "property double z\nelement face 1\nproperty list uchar int vertex_indices\nend_header\n"
+                          "TINY\n1 0 0\n0 1 0\n3 0 1 2\n";
+  const std::string stl = "solid s\nfacet normal 0 0 1e-999\nouter loop\nvertex TINY\nvertex 1 0 0\nvertex 0 1 0\n"
+                          "endloop\nendfacet\nendsolid\n";
+  const std::vector<std::pair<std::string, std::string>> files = {
+      {"t.obj", "v TINY\nv 1 0 0\nv 0 1 0\nf 1 2 3\n"},
+      {"t.off", "OFF\n3 1 0\nTINY\n1 0 0\n0 1 0\n3 0 1 2\n"},
+      {"t.stl", stl},
+      {"t.ply", ply}};
+  for (const auto &[name, text] : files)
+  {
+    std::string tiny = text, huge = text;
+    tiny.replace(tiny.find("TINY"), 4, "1e-400 -0.000001e-318 2.5e-320");
+    huge.replace(huge.find("TINY"), 4, "1 0 1e+309");
+    const Mesh mesh = Load(name, tiny);
+    ASSERT_FALSE(mesh.vertices.empty()) << name;
+    EXPECT_EQ(mesh.vertices[0], (std::array<double, 3>{0.0, 0.0, std::strtod("2.5e-320", nullptr)})) << name;
+    EXPECT_TRUE(std::signbit(mesh.vertices[0][1])) << name;
+    EXPECT_CONTAINS(Fail(name, huge), "number '1e+309' is out of the range of a double");
+  }
+
+  // Near both ends of the range the reader agrees with strtod, bit for bit.
+  std::mt19937 rng(20250301u);
+  for (int i = 0; i < 3000; ++i)
+  {
+    const int exponent = std::uniform_int_distribution<int>(-345, -300)(rng) + (i % 2 ? 630 : 0);
+    const std::string token = (rng() % 2 ? "-" : "") + std::to_string(rng() % 100000) + "." +
+                              std::to_string(rng() % 1000) + "e" + std::to_string(exponent);
+    const double expected = std::strtod(token.c_str(), nullptr);
+    double value = 7.0;
+    ASSERT_EQ(rkmclash::ParseFiniteNumber(token, value), std::isfinite(expected)) << token;
+    if (std::isfinite(expected))
+    {
+      ASSERT_EQ(std::memcmp(&value, &expected, sizeof value), 0) << token;
+    }
+  }
+  double value = 7.0;
+  for (const char *bad : {"", "1e999", "inf", "nan", "0x1p3", "1,5", " 1", "1 ", "--1"})
+    EXPECT_FALSE(rkmclash::ParseFiniteNumber(bad, value)) << bad;
+  EXPECT_EQ(value, 7.0);
+  EXPECT_TRUE(rkmclash::ParseFiniteNumber("0." + std::string(400, '0') + "1", value));
+  EXPECT_EQ(value, 0.0);
+}
+
 // --- robustness ---
 
 // Damages valid files in every way a fixed seed can think of. Each read must come back, true or false;
@@ -591,6 +811,8 @@ TEST_F(RKMMeshReader, DamagedFilesNeverCrash)
       {"sample.off", kOff},
       {"binary.stl", BinaryStl(kTwoTriangles)},
       {"solidbinary.stl", BinaryStl(kTwoTriangles, "solid but binary")},
+      {"sample.ply", Ply("ascii", kPlyHeader, kPlyRows)},
+      {"binary.ply", Ply("binary_big_endian", kPlyHeader, kPlyRows)},
   };
   const std::vector<std::string> pieces = {"0",           "-1",
                                            "-0",          "nan",

@@ -1,10 +1,12 @@
+// The mesh readers: the OBJ, OFF and STL parsers with the vertex welder of STL, what every reader shares
+// (RKMMeshReaderParts.h), and the choice of a reader by the file's extension.
+
 #include "RKMMeshReader.h"
+#include "RKMMeshReaderParts.h"
 
 #include <algorithm>
 #include <cctype>
 #include <cerrno>
-#include <charconv>
-#include <climits>
 #include <cmath>
 #include <cstdint>
 #include <cstdio>
@@ -20,21 +22,50 @@
 
 namespace rkmclash
 {
+namespace reading
+{
 namespace
 {
-// Parsers bail out from any depth by throwing this; the public functions turn it into a false return, so
-// it never reaches the caller.
-struct ReadError
+// from_chars gives subnormals but calls a value out of range when it rounds to zero or to infinity. Which
+// of the two shows in the decimal exponent of the first significant digit; `token` has a form that
+// from_chars accepted, [-]digits[.digits][(e|E)[+|-]digits], since inf and nan are never out of range.
+bool IsBelowTheSmallestDouble(std::string_view token)
 {
-  std::string message;
-};
-
-// Mesh stores int indices, so no mesh may hold more vertices than an int can count.
-constexpr std::size_t kMaxVertices = static_cast<std::size_t>(INT_MAX);
-constexpr std::size_t kProgressStep = 64 * 1024;
-
-std::string Str(std::size_t value) { return std::to_string(value); }
-std::string Str(long long value) { return std::to_string(value); }
+  std::size_t i = !token.empty() && token[0] == '-' ? 1 : 0;
+  const auto isDigit = [&](std::size_t k) { return k < token.size() && token[k] >= '0' && token[k] <= '9'; };
+  const std::size_t integerStart = i;
+  while (isDigit(i))
+    ++i;
+  bool found = false;
+  long long lead = 0;
+  for (std::size_t k = integerStart; k < i && !found; ++k)
+    if (token[k] != '0')
+    {
+      found = true;
+      lead = static_cast<long long>(i - k) - 1;
+    }
+  if (i < token.size() && token[i] == '.')
+    for (const std::size_t fractionStart = ++i; isDigit(i); ++i)
+      if (!found && token[i] != '0')
+      {
+        found = true;
+        lead = -static_cast<long long>(i - fractionStart) - 1;
+      }
+  long long exponent = 0;
+  if (i < token.size() && (token[i] == 'e' || token[i] == 'E'))
+  {
+    const bool negative = ++i < token.size() && token[i] == '-';
+    if (i < token.size() && (token[i] == '-' || token[i] == '+'))
+      ++i;
+    // Saturates far beyond any double's exponent, so that no digit string can overflow it.
+    for (; isDigit(i); ++i)
+      exponent = std::min(exponent * 10 + (token[i] - '0'), 1000000000000LL);
+    if (negative)
+      exponent = -exponent;
+  }
+  return !found || lead + exponent < 0;
+}
+} // namespace
 
 // Tokens come from untrusted files: keep messages short and printable whatever the bytes are.
 std::string Quote(std::string_view token)
@@ -61,85 +92,23 @@ std::string Quote(std::string_view token)
   return out;
 }
 
-class Context
+NumberStatus ParseReal(std::string_view token, double &value)
 {
-public:
-  explicit Context(std::string name) : m_name(std::move(name)) {}
-
-  [[noreturn]] void Fail(const std::string &message) const { throw ReadError{m_name + ": " + message}; }
-  [[noreturn]] void FailAt(std::size_t line, const std::string &message) const
-  {
-    throw ReadError{m_name + ":" + Str(line) + ": " + message};
-  }
-
-private:
-  std::string m_name;
-};
-
-// Reports the fraction of one phase (reading or parsing) mapped into [base, base + span] of the whole,
-// at most once per kProgressStep bytes so that a per-line call costs only a comparison.
-class Progress
-{
-public:
-  Progress(const std::function<void(double)> *callback, double base, double span)
-      : m_callback(callback != nullptr && *callback ? callback : nullptr), m_base(base), m_span(span)
-  {
-  }
-
-  void Update(std::size_t done, std::size_t total)
-  {
-    if (m_callback == nullptr || done < m_next)
-      return;
-    m_next = done + kProgressStep;
-    const double fraction = total == 0 ? 1.0 : std::min(1.0, static_cast<double>(done) / static_cast<double>(total));
-    (*m_callback)(m_base + m_span * fraction);
-  }
-
-private:
-  const std::function<void(double)> *m_callback;
-  double m_base;
-  double m_span;
-  std::size_t m_next = 0;
-};
-
-enum class NumberStatus
-{
-  Ok,
-  Malformed,
-  OutOfRange
-};
-
-// std::from_chars is locale-independent and does not accept a leading '+', which files do contain.
-std::string_view StripPlus(std::string_view token, bool &ok)
-{
-  ok = true;
-  if (!token.empty() && token.front() == '+')
-  {
-    token.remove_prefix(1);
-    ok = !token.empty() && token.front() != '-' && token.front() != '+';
-  }
-  return token;
-}
-
-template <typename T> NumberStatus ParseNumber(std::string_view token, T &value)
-{
+  const NumberStatus status = ParseNumber(token, value);
+  if (status != NumberStatus::OutOfRange)
+    return status;
   bool ok;
-  token = StripPlus(token, ok);
-  if (!ok || token.empty())
-    return NumberStatus::Malformed;
-  const char *last = token.data() + token.size();
-  const auto [ptr, ec] = std::from_chars(token.data(), last, value);
-  if (ptr != last)
-    return NumberStatus::Malformed;
-  if (ec == std::errc::result_out_of_range)
+  const std::string_view number = StripPlus(token, ok);
+  if (!IsBelowTheSmallestDouble(number))
     return NumberStatus::OutOfRange;
-  return ec == std::errc() ? NumberStatus::Ok : NumberStatus::Malformed;
+  value = !number.empty() && number[0] == '-' ? -0.0 : 0.0;
+  return NumberStatus::Ok;
 }
 
 double ParseCoordinate(const Context &ctx, std::size_t line, std::string_view token)
 {
   double value = 0.0;
-  switch (ParseNumber(token, value))
+  switch (ParseReal(token, value))
   {
   case NumberStatus::Malformed:
     ctx.FailAt(line, "malformed number " + Quote(token));
@@ -152,102 +121,17 @@ double ParseCoordinate(const Context &ctx, std::size_t line, std::string_view to
     ctx.FailAt(line, "coordinate " + Quote(token) + " is not a finite number");
   return value;
 }
+} // namespace reading
+
+namespace
+{
+using namespace reading;
 
 bool IsInteger(std::string_view token)
 {
   long long value;
   return ParseNumber(token, value) != NumberStatus::Malformed;
 }
-
-std::string Range(long long first, long long last)
-{
-  if (last < first)
-    return "(no vertices defined)";
-  return "(" + Str(first) + ".." + Str(last) + ")";
-}
-
-void AddFan(const std::vector<int> &polygon, std::vector<std::array<int, 3>> &triangles)
-{
-  for (std::size_t i = 1; i + 1 < polygon.size(); ++i)
-    triangles.push_back({polygon[0], polygon[i], polygon[i + 1]});
-}
-
-// Splits text into lines (LF, CRLF or a lone CR) and lines into whitespace-separated tokens, dropping
-// '#' comments. Control characters other than whitespace are rejected here, because they mean the file
-// is binary or damaged, and saying so beats a confusing complaint about some number further on.
-class LineReader
-{
-public:
-  LineReader(const Context &ctx, std::string_view text, Progress &progress)
-      : m_ctx(ctx), m_text(text), m_progress(progress)
-  {
-    if (m_text.substr(0, 3) == "\xEF\xBB\xBF")
-      m_pos = 3;
-  }
-
-  bool Next(std::vector<std::string_view> &tokens)
-  {
-    tokens.clear();
-    if (m_pos >= m_text.size())
-      return false;
-    ++m_line;
-    m_progress.Update(m_pos, m_text.size());
-    const std::size_t start = m_pos;
-    std::size_t end = start;
-    while (end < m_text.size() && m_text[end] != '\n' && m_text[end] != '\r')
-      ++end;
-    m_pos = end;
-    if (m_pos < m_text.size())
-      m_pos += (m_text[m_pos] == '\r' && m_pos + 1 < m_text.size() && m_text[m_pos + 1] == '\n') ? 2 : 1;
-    Tokenize(m_text.substr(start, end - start), tokens);
-    return true;
-  }
-
-  std::size_t Line() const { return m_line; }
-  std::size_t Offset() const { return m_pos; }
-
-  [[noreturn]] void FailAtEnd(const std::string &message) const
-  {
-    if (m_line == 0)
-      m_ctx.Fail(message);
-    m_ctx.FailAt(m_line, message);
-  }
-
-private:
-  static bool IsSpace(char c) { return c == ' ' || c == '\t' || c == '\v' || c == '\f'; }
-
-  void Tokenize(std::string_view line, std::vector<std::string_view> &tokens) const
-  {
-    for (const char c : line)
-    {
-      const auto u = static_cast<unsigned char>(c);
-      if (u < 0x20 && !IsSpace(c))
-        m_ctx.FailAt(m_line, "unexpected control character " + Quote(std::string_view(&c, 1)) +
-                                 " (binary data in a text file?)");
-    }
-    std::size_t i = 0;
-    while (i < line.size())
-    {
-      if (IsSpace(line[i]))
-      {
-        ++i;
-        continue;
-      }
-      if (line[i] == '#')
-        break;
-      const std::size_t start = i;
-      while (i < line.size() && !IsSpace(line[i]) && line[i] != '#')
-        ++i;
-      tokens.push_back(line.substr(start, i - start));
-    }
-  }
-
-  const Context &m_ctx;
-  std::string_view m_text;
-  Progress &m_progress;
-  std::size_t m_pos = 0;
-  std::size_t m_line = 0;
-};
 
 void AddVertex(const Context &ctx, std::size_t line, Mesh &mesh, const std::array<double, 3> &p)
 {
@@ -619,7 +503,7 @@ void ParseAsciiStl(const Context &ctx, std::string_view text, Progress &progress
       for (std::size_t i = 2; i < 5; ++i)
       {
         double ignored;
-        if (ParseNumber(tokens[i], ignored) == NumberStatus::Malformed)
+        if (ParseReal(tokens[i], ignored) == NumberStatus::Malformed)
           ctx.FailAt(line, "malformed number " + Quote(tokens[i]));
       }
       state = State::InFacet;
@@ -717,6 +601,7 @@ enum class Format
   Obj,
   Stl,
   Off,
+  Ply,
   Unknown
 };
 
@@ -732,6 +617,8 @@ Format FormatFromName(std::string name)
     return Format::Stl;
   if (name == "off")
     return Format::Off;
+  if (name == "ply")
+    return Format::Ply;
   return Format::Unknown;
 }
 
@@ -767,6 +654,8 @@ void Parse(Format format, const Context &ctx, std::string_view data, Progress &p
     return ParseStl(ctx, data, progress, mesh);
   case Format::Off:
     return ParseOff(ctx, data, progress, mesh);
+  case Format::Ply:
+    return ParsePly(ctx, data, progress, mesh);
   case Format::Unknown:
     break;
   }
@@ -818,7 +707,7 @@ template <typename Body> bool Guarded(const std::string &name, std::string &erro
     }
     catch (const std::bad_alloc &)
     {
-      message = name + ": out of memory while reading the mesh";
+      message = "out of memory while reading " + name;
     }
     catch (const std::exception &e)
     {
@@ -846,10 +735,10 @@ bool ReadMesh(const std::string &path, Mesh &out, std::string &error, const std:
                    const Context ctx(path);
                    const std::string extension = Extension(path);
                    const Format format = FormatFromName(extension);
+                   const std::string expected = "; expected .obj, .stl, .off or .ply";
                    if (format == Format::Unknown)
-                     ctx.Fail(extension.empty() ? std::string("has no file extension; expected .obj, .stl or .off")
-                                                : "unknown mesh file extension " + Quote(extension) +
-                                                      "; expected .obj, .stl or .off");
+                     ctx.Fail(extension.empty() ? "has no file extension" + expected
+                                                : "unknown mesh file extension " + Quote(extension) + expected);
                    // Reading is much cheaper than parsing, hence the split of the progress range.
                    Progress reading(&progress, 0.0, 0.25);
                    const std::string data = ReadWholeFile(ctx, path, reading);
@@ -872,12 +761,21 @@ bool ReadMeshFromMemory(const std::string &text, const std::string &formatHint, 
                    const Context ctx(nameForMessages);
                    const Format format = FormatFromName(formatHint);
                    if (format == Format::Unknown)
-                     ctx.Fail("unknown mesh format " + Quote(formatHint) + "; expected obj, stl or off");
+                     ctx.Fail("unknown mesh format " + Quote(formatHint) + "; expected obj, stl, off or ply");
                    Progress none(nullptr, 0.0, 1.0);
                    Mesh mesh;
                    Parse(format, ctx, text, none, mesh);
                    mesh.name = Stem(nameForMessages);
                    out = std::move(mesh);
                  });
+}
+
+bool ParseFiniteNumber(std::string_view token, double &value)
+{
+  double parsed = 0.0;
+  if (ParseReal(token, parsed) != NumberStatus::Ok || !std::isfinite(parsed))
+    return false;
+  value = parsed;
+  return true;
 }
 } // namespace rkmclash

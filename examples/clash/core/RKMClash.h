@@ -1,26 +1,30 @@
 #pragma once
 
+// The clash pipeline: the scene (meshes and their placements), the options and the report of the exact
+// clash test, and the steps from reading the meshes to writing the curves and the picture.
+
 #include <array>
 #include <functional>
 #include <string>
 #include <vector>
 
+#include "RKMBVHTreeBuilder.h"
 #include "RKMMathTransformation.h"
+#include "RKMMeshReader.h"
 
 namespace rkmclash
 {
-/// A triangle mesh as the readers give it: vertices and 0-based vertex triples.
-struct InputMesh
-{
-  std::vector<std::array<double, 3>> vertices;
-  std::vector<std::array<int, 3>> triangles;
-  std::string name;
-};
-
 /// A mesh placed in the scene by a rigid motion (rotation, then translation).
 struct PlacedMesh
 {
-  InputMesh mesh;
+  Mesh mesh;
+  RKMMathTransformation placement;
+};
+
+/// A mesh file to read and where to put its mesh.
+struct MeshFile
+{
+  std::string path;
   RKMMathTransformation placement;
 };
 
@@ -59,8 +63,8 @@ struct ClashOptions
 {
   /// Snap the placed coordinates to the grid of their box instead of deciding on them as they are.
   bool gridded = false;
-  /// 0 flat, 1 grid (linear time), 2 greedy.
-  int strategy = 1;
+  /// How the hierarchies are built: flat, grid (linear time) or greedy.
+  RKMBVHTreeBuilder::SpatialOptimization strategy = RKMBVHTreeBuilder::Basic;
   /// Called now and then with a fraction done, for a progress line.
   std::function<void(const char *phase, double fraction)> progress;
 };
@@ -72,6 +76,21 @@ struct ClashReport
   double prepareSeconds = 0.0, buildSeconds = 0.0, walkSeconds = 0.0;
   long objectPairsTested = 0, trianglePairsTested = 0;
 };
+
+// The functions that answer a bool throw nothing: they return false with a message, which starts with
+// "out of memory" when memory ran out (or is empty, when even the message could not be made).
+
+/// For programs: sets memory aside that the first failed allocation gets back (through the new
+/// handler), so that running out is reported like any failure. Without it, an exception may find no
+/// memory to be made in and end the process. False when even the reserve cannot be had.
+bool ReserveMemoryForFailures() noexcept;
+
+/// Reads the files and places each mesh as its file says; with no file, the built-in scene: the bunny
+/// given as OBJ text against a turned and shifted copy of itself. At least two meshes are needed.
+/// `readSeconds` is the time taken; `progress` hears of each file's reading.
+bool LoadScene(const std::vector<MeshFile> &files, const char *builtInBunnyObj, std::vector<PlacedMesh> &meshes,
+               double &readSeconds, std::string &error,
+               const std::function<void(const std::string &path, double fraction)> &progress = {});
 
 /// Finds every contact between triangles of different meshes, exactly. False with a message when the
 /// input cannot be handled (no mesh, a triangle with a bad index, a coordinate that is not finite, or
@@ -89,7 +108,19 @@ std::vector<std::array<double, 3>> PlacedVertices(const PlacedMesh &mesh);
 /// A rotation by the given angles in degrees about x, then y, then z, followed by a translation.
 RKMMathTransformation MakePlacement(double tx, double ty, double tz, double rxDeg, double ryDeg, double rzDeg);
 
-/// Writes the curves as OBJ polylines (one `l` per segment). False with a message on failure.
+/// The files the report is written to: PREFIX_curves.obj and PREFIX.svg. A prefix that ends with a
+/// slash, or names a directory, stands for the prefix "clash" in it.
+struct OutputFiles
+{
+  std::string curves, picture;
+};
+OutputFiles OutputFilesFor(const std::string &prefix);
+
+/// Writes the curves and the picture (seen along axis 0, 1 or 2), creating missing directories.
+bool WriteOutputs(const OutputFiles &files, const std::vector<PlacedMesh> &meshes, const ClashReport &report, int axis,
+                  std::string &error);
+
+/// Writes the curves as OBJ polylines (one `l` per segment).
 bool WriteCurvesObj(const std::string &path, const ClashReport &report, std::string &error);
 
 /// Writes an SVG: the meshes' edges in light outline, seen along axis 0, 1 or 2, and the curves over
