@@ -1,62 +1,46 @@
-// The clash pipeline's tests: small scenes whose contacts are known, and the bunny against the
-// brute-force reference.
-
-#include <gtest/gtest.h>
-
-#include <algorithm>
-#include <cmath>
-#include <set>
-#include <string>
-#include <tuple>
-#include <vector>
+// The clash pipeline's tests: small scenes whose contacts are known, each also checked against the
+// brute-force pass over every triangle pair, and the bunny against the brute-force pass.
 
 #include "RKMClash.h"
 #include "RKMMeshReader.h"
 
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <set>
+#include <tuple>
+
 namespace
 {
 using namespace rkmclash;
+using Point = std::array<double, 3>;
 
-Mesh Tetrahedron(const std::array<double, 3> &a, const std::array<double, 3> &b, const std::array<double, 3> &c,
-                 const std::array<double, 3> &d, const std::string &name)
+Mesh Tetrahedron(const Point &a, const Point &b, const Point &c, const Point &d)
 {
-  Mesh m;
-  m.vertices = {a, b, c, d};
-  m.triangles = {{0, 2, 1}, {0, 1, 3}, {1, 2, 3}, {2, 0, 3}};
-  m.name = name;
-  return m;
+  return Mesh{{a, b, c, d}, {{0, 2, 1}, {0, 1, 3}, {1, 2, 3}, {2, 0, 3}}, "tetra"};
 }
 
-PlacedMesh Placed(const Mesh &m, const RKMMathTransformation &t = RKMMathTransformation())
+PlacedMesh Placed(const Mesh &m, const RKMMathTransformation &t = RKMMathTransformation()) { return {m, t}; }
+
+// The contacts of the pair of objects 0 and 1, with their kinds; none when the pair is not reported.
+std::set<std::tuple<int, int, int>> Contacts(const std::vector<ObjectPairReport> &pairs)
 {
-  PlacedMesh p;
-  p.mesh = m;
-  p.placement = t;
-  return p;
+  std::set<std::tuple<int, int, int>> keys;
+  for (const ObjectPairReport &p : pairs)
+    for (const TrianglePair &t : p.pairs)
+      keys.insert({t.triangle[0], t.triangle[1], static_cast<int>(t.kind)});
+  return keys;
 }
 
-struct Totals
-{
-  long crossing = 0, touching = 0, coplanar = 0;
-};
-
-Totals RunScene(const std::vector<PlacedMesh> &meshes, bool gridded, ClashReport *out = nullptr)
+ClashReport Clash(const std::vector<PlacedMesh> &meshes, bool gridded)
 {
   ClashOptions options;
   options.gridded = gridded;
   ClashReport report;
   std::string error;
   EXPECT_TRUE(FindClashes(meshes, options, report, error)) << error;
-  Totals t;
-  for (const ObjectPairReport &p : report.pairs)
-  {
-    t.crossing += p.crossing;
-    t.touching += p.touching;
-    t.coplanar += p.coplanar;
-  }
-  if (out)
-    *out = report;
-  return t;
+  EXPECT_LE(report.pairs.size(), 1u);
+  return report;
 }
 
 Mesh Bunny()
@@ -67,114 +51,80 @@ Mesh Bunny()
   return m;
 }
 
-using PairKey = std::tuple<int, int, int>;
-
-std::set<PairKey> Keys(const ObjectPairReport &p)
+TEST(RKMClash, SmallScenesHaveTheirKnownContacts)
 {
-  std::set<PairKey> keys;
-  for (const TrianglePair &t : p.pairs)
-    keys.insert({t.triangle[0], t.triangle[1], static_cast<int>(t.kind)});
-  return keys;
-}
-} // namespace
-
-// A tetrahedron whose apex pokes through the slanted face of another: its three side faces each
-// cross that face, and nothing else meets.
-TEST(RKMClash, TetrahedronPokingThroughAFace)
-{
-  const Mesh t1 = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "corner");
-  const Mesh t2 = Tetrahedron({1, 1, 1}, {5, 2, 2}, {2, 5, 2}, {2, 2, 5}, "spike");
-  for (bool gridded : {false, true})
+  const Mesh corner = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4});
+  const Mesh square{{{0, 0, 0}, {2, 0, 0}, {2, 2, 0}, {0, 2, 0}}, {{0, 1, 2}, {0, 2, 3}}, "square"};
+  struct Scene
   {
-    ClashReport report;
-    const Totals t = RunScene({Placed(t1), Placed(t2)}, gridded, &report);
-    EXPECT_EQ(t.crossing, 3) << gridded;
-    EXPECT_EQ(t.touching, 0) << gridded;
-    EXPECT_EQ(t.coplanar, 0) << gridded;
-    ASSERT_EQ(report.pairs.size(), 1u);
-    EXPECT_EQ(report.pairs[0].curves.size(), 3u);
-    // Every curve point lies on the slanted face x + y + z = 4.
-    for (const CurveSegment &s : report.pairs[0].curves)
-      for (const auto &p : {s.from, s.to})
-        EXPECT_NEAR(p[0] + p[1] + p[2], 4.0, 1e-9);
-  }
+    const char *name;
+    std::vector<PlacedMesh> meshes;
+    long crossing, touching, coplanar;
+  };
+  const Scene scenes[] = {
+      // Its three side faces each cross the slanted face x + y + z = 4, and nothing else meets.
+      {"apex through a face",
+       {Placed(corner), Placed(Tetrahedron({1, 1, 1}, {5, 2, 2}, {2, 5, 2}, {2, 2, 5}))},
+       3,
+       0,
+       0},
+      // Each face lies on its copy, and only touches the copies of the three faces that share an edge.
+      {"a tetrahedron against itself", {Placed(corner), Placed(corner)}, 0, 12, 4},
+      // Lower halves overlap, upper halves overlap; the crossed halves meet along the diagonal only.
+      {"coplanar squares", {Placed(square), Placed(square, MakePlacement(1, 1, 0, 0, 0, 0))}, 0, 2, 2},
+      {"far apart", {Placed(corner), Placed(corner, MakePlacement(1000, 0, 0, 0, 0, 0))}, 0, 0, 0},
+  };
+  for (const Scene &scene : scenes)
+    for (bool gridded : {false, true})
+    {
+      SCOPED_TRACE(std::string(scene.name) + (gridded ? ", gridded" : ""));
+      const ClashReport report = Clash(scene.meshes, gridded);
+      ObjectPairReport got;
+      if (!report.pairs.empty())
+        got = report.pairs[0];
+      EXPECT_EQ(std::make_tuple(got.crossing, got.touching, got.coplanar),
+                std::make_tuple(scene.crossing, scene.touching, scene.coplanar));
+      EXPECT_EQ(Contacts(report.pairs), Contacts({BruteForcePair(scene.meshes, 0, 1, gridded)}));
+      EXPECT_EQ(got.curves.size(), static_cast<size_t>(scene.crossing));
+      // Every curve point lies on the crossed face x + y + z = 4.
+      for (const CurveSegment &s : got.curves)
+        for (const Point &p : {s.from, s.to})
+          EXPECT_NEAR(p[0] + p[1] + p[2], 4.0, 1e-9);
+    }
 }
 
-TEST(RKMClash, FarApartMeshesDoNotMeet)
-{
-  const Mesh bunny = Bunny();
-  for (bool gridded : {false, true})
-  {
-    ClashReport report;
-    const Totals t = RunScene({Placed(bunny), Placed(bunny, MakePlacement(1000, 0, 0, 0, 0, 0))}, gridded, &report);
-    EXPECT_EQ(t.crossing + t.touching + t.coplanar, 0);
-    EXPECT_EQ(report.trianglePairsTested, 0);
-  }
-}
-
-// Identical placement: each triangle lies on its copy (a coplanar overlap), its neighbours' copies
-// only touch it, and nothing crosses.
-TEST(RKMClash, MeshAgainstItselfOnlyTouches)
-{
-  const Mesh t = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "tetra");
-  for (bool gridded : {false, true})
-  {
-    const Totals totals = RunScene({Placed(t), Placed(t)}, gridded);
-    EXPECT_EQ(totals.crossing, 0);
-    EXPECT_EQ(totals.coplanar, 4);
-    // Every two faces of a tetrahedron share an edge.
-    EXPECT_EQ(totals.touching, 12);
-  }
-}
-
-TEST(RKMClash, OverlappingCoplanarSquares)
-{
-  Mesh a;
-  a.vertices = {{0, 0, 0}, {2, 0, 0}, {2, 2, 0}, {0, 2, 0}};
-  a.triangles = {{0, 1, 2}, {0, 2, 3}};
-  a.name = "a";
-  Mesh b = a;
-  b.name = "b";
-  for (bool gridded : {false, true})
-  {
-    const Totals t = RunScene({Placed(a), Placed(b, MakePlacement(1, 1, 0, 0, 0, 0))}, gridded);
-    EXPECT_EQ(t.crossing, 0);
-    // Lower halves overlap, upper halves overlap; the crossed halves meet along the diagonal only.
-    EXPECT_EQ(t.coplanar, 2);
-    EXPECT_EQ(t.touching, 2);
-  }
-}
-
-// The hierarchy walk finds exactly the contacts that testing every pair of triangles finds.
-TEST(RKMClash, BunnySceneMatchesBruteForce)
+TEST(RKMClash, BunnyScenesMatchBruteForce)
 {
   const Mesh bunny = Bunny();
   ASSERT_EQ(bunny.triangles.size(), 3674u);
   const std::vector<PlacedMesh> meshes = {Placed(bunny), Placed(bunny, MakePlacement(0.9, 0.4, 0.3, 8.0, 25.0, 4.0))};
   for (bool gridded : {false, true})
   {
-    ClashReport report;
-    const Totals t = RunScene(meshes, gridded, &report);
-    EXPECT_GT(t.crossing, 50) << gridded;
+    const ClashReport report = Clash(meshes, gridded);
     ASSERT_EQ(report.pairs.size(), 1u);
+    EXPECT_GT(report.pairs[0].crossing, 50) << gridded;
     const ObjectPairReport brute = BruteForcePair(meshes, 0, 1, gridded);
-    EXPECT_EQ(Keys(report.pairs[0]), Keys(brute)) << gridded;
+    EXPECT_EQ(Contacts(report.pairs), Contacts({brute})) << gridded;
     EXPECT_EQ(report.pairs[0].crossing, brute.crossing);
+    // Far apart, the hierarchies keep every triangle pair from being tested.
+    const ClashReport far = Clash({Placed(bunny), Placed(bunny, MakePlacement(1000, 0, 0, 0, 0, 0))}, gridded);
+    EXPECT_TRUE(far.pairs.empty() || Contacts(far.pairs).empty());
+    EXPECT_EQ(far.trianglePairsTested, 0);
   }
 }
 
 TEST(RKMClash, BadInputIsRefused)
 {
-  const Mesh t = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4}, "tetra");
+  const Mesh t = Tetrahedron({0, 0, 0}, {4, 0, 0}, {0, 4, 0}, {0, 0, 4});
+  Mesh bad = t, nan = t;
+  bad.triangles.push_back({0, 1, 7});
+  nan.vertices[2][1] = std::nan("");
   ClashReport report;
   std::string error;
   EXPECT_FALSE(FindClashes({Placed(t)}, ClashOptions(), report, error));
-  Mesh bad = t;
-  bad.triangles.push_back({0, 1, 7});
   EXPECT_FALSE(FindClashes({Placed(t), Placed(bad)}, ClashOptions(), report, error));
   EXPECT_NE(error.find("tetra"), std::string::npos) << error;
-  Mesh nan = t;
-  nan.vertices[2][1] = std::nan("");
   EXPECT_FALSE(FindClashes({Placed(t), Placed(nan)}, ClashOptions(), report, error));
   EXPECT_NE(error.find("not finite"), std::string::npos) << error;
 }
+} // namespace
