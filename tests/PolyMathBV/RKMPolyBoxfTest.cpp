@@ -15,13 +15,12 @@
 #include <limits>
 #include <random>
 #include <string>
+#include <utility>
 
 namespace
 {
-constexpr float kInfF = std::numeric_limits<float>::infinity();
-constexpr double kInf = std::numeric_limits<double>::infinity();
-constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
-constexpr float kNaNF = std::numeric_limits<float>::quiet_NaN();
+constexpr float kInfF = std::numeric_limits<float>::infinity(), kNaNF = std::numeric_limits<float>::quiet_NaN();
+constexpr double kInf = std::numeric_limits<double>::infinity(), kNaN = std::numeric_limits<double>::quiet_NaN();
 using Order = RKMPolyBoxf::IntersectionTestOrder;
 
 std::uint32_t Bits(float f)
@@ -30,7 +29,6 @@ std::uint32_t Bits(float f)
   std::memcpy(&i, &f, sizeof i);
   return i;
 }
-
 float Down(float f) { return std::nextafterf(f, -kInfF); }
 float Up(float f) { return std::nextafterf(f, kInfF); }
 
@@ -52,9 +50,10 @@ void Bounds(const RKMPolyBoxf &b, float lo[3], float hi[3])
   lo[0] = b.GetXMin(), lo[1] = b.GetYMin(), lo[2] = b.GetZMin();
   hi[0] = b.GetXMax(), hi[1] = b.GetYMax(), hi[2] = b.GetZMax();
 }
+bool SameBits(const RKMPolyBoxf &a, const RKMPolyBoxf &b) { return std::memcmp(&a, &b, sizeof a) == 0; }
 
-// A double-derived bound must enclose the value, but by no more than two float steps, so that
-// "make it infinite" cannot pass for correct rounding. A NaN value must leave the side open.
+// A double-derived bound must enclose the value, but by no more than two float steps, so that "make it
+// infinite" cannot pass for correct rounding. A NaN value must leave the side open.
 void ExpectEncloses(const RKMPolyBoxf &b, const double lo[3], const double hi[3])
 {
   float fl[3], fh[3];
@@ -99,8 +98,8 @@ RKMMathBox RandomBox(std::mt19937_64 &rng, double lo[3], double hi[3])
   return RKMMathBox(lo[0], hi[0], lo[1], hi[1], lo[2], hi[2]);
 }
 
-// Whether a + b >= c holds exactly rather than after rounding the sum (finite values), using the
-// two-sum rounding error.
+// Whether a + b >= c holds exactly rather than after rounding the sum (finite values), by the two-sum
+// rounding error.
 bool SumAtLeast(double a, double b, double c)
 {
   const double s = a + b, bv = s - a, err = (a - (s - bv)) + (b - bv);
@@ -108,34 +107,29 @@ bool SumAtLeast(double a, double b, double c)
 }
 } // namespace
 
+// Built from doubles in three ways, grown point by point and box by box (only the bounds that move get
+// stepped), or inflated, the box encloses the geometry tightly.
 TEST(RKMPolyBoxfEnclosure, RandomDoubleGeometryIsEnclosedTightly)
 {
-  const unsigned seed = 20240611u;
-  SCOPED_TRACE("seed " + std::to_string(seed));
-  std::mt19937_64 rng(seed);
+  std::mt19937_64 rng(20240611u);
   for (int iter = 0; iter < 3000; ++iter)
   {
-    SCOPED_TRACE("iteration " + std::to_string(iter));
+    SCOPED_TRACE("seed 20240611, iteration " + std::to_string(iter));
     double lo[3], hi[3];
     const RKMMathBox m = RandomBox(rng, lo, hi);
-    ExpectEncloses(RKMPolyBoxf(lo[0], hi[0], lo[1], hi[1], lo[2], hi[2]), lo, hi);
-    ExpectEncloses(RKMPolyBoxf(m), lo, hi);
-    RKMPolyBoxf viaSet(1.0f, 2.0f, 1.0f, 2.0f, 1.0f, 2.0f);
+    RKMPolyBoxf viaSet(1.0f, 2.0f, 1.0f, 2.0f, 1.0f, 2.0f), points, boxes, inflated(m);
     viaSet.SetBox(m);
-    ExpectEncloses(viaSet, lo, hi);
-
-    // Added one at a time, the box holds everything so far and stays within two steps of the
-    // running extremes, since only the bounds that move get stepped.
-    RKMPolyBoxf points, boxes;
-    double plo[3] = {kInf, kInf, kInf}, phi[3] = {-kInf, -kInf, -kInf};
-    double blo[3] = {kInf, kInf, kInf}, bhi[3] = {-kInf, -kInf, -kInf};
+    for (const RKMPolyBoxf &b : {RKMPolyBoxf(lo[0], hi[0], lo[1], hi[1], lo[2], hi[2]), RKMPolyBoxf(m), viaSet})
+      ExpectEncloses(b, lo, hi);
+    double plo[3] = {kInf, kInf, kInf}, phi[3] = {-kInf, -kInf, -kInf}, blo[3] = {kInf, kInf, kInf},
+           bhi[3] = {-kInf, -kInf, -kInf};
     for (int k = 0; k < 4; ++k)
     {
       const RKMMathPoint p(RandomDouble(rng), RandomDouble(rng), RandomDouble(rng));
-      points.AddInside(p);
-      EXPECT_TRUE(points.IsContaining(p));
       double l[3], h[3];
+      points.AddInside(p);
       boxes.AddInside(RandomBox(rng, l, h));
+      EXPECT_TRUE(points.IsContaining(p));
       for (int i = 0; i < 3; ++i)
       {
         plo[i] = std::min(plo[i], p[i]), phi[i] = std::max(phi[i], p[i]);
@@ -144,10 +138,8 @@ TEST(RKMPolyBoxfEnclosure, RandomDoubleGeometryIsEnclosedTightly)
       ExpectEncloses(points, plo, phi);
       ExpectEncloses(boxes, blo, bhi);
     }
-
-    // The inflated box holds the inflated math box and stays near the float bounds moved by d.
+    // Inflated, it holds the inflated math box and stays near its float bounds moved by d.
     const double d = RandomDouble(rng);
-    RKMPolyBoxf inflated(m);
     float bl[3], bh[3];
     Bounds(inflated, bl, bh);
     RKMMathBox mInflated = m;
@@ -159,95 +151,79 @@ TEST(RKMPolyBoxfEnclosure, RandomDoubleGeometryIsEnclosedTightly)
                 (inflated.IsContaining(mInflated.GetLow()) && inflated.IsContaining(mInflated.GetHigh())))
         << "d " << d;
   }
-}
-
-TEST(RKMPolyBoxfEnclosure, InflateByNonFloatDistanceEnclosesDoubleInflation)
-{
   // A bound and a distance that nearly cancel: rounding d to float before moving the bound would lose
   // more than the final step at the small result covers.
   const double a = 1.0 - 0x1p-25 + 0x1p-40, d = 1.0 + 0x1p-24 - 0x1p-40;
   RKMMathBox m(a, 2.0, a, 2.0, a, 2.0);
-  RKMPolyBoxf b(m);
+  RKMPolyBoxf b(m), unit(1.0f, 1.0f, 1.0f, 1.0f, 1.0f, 1.0f);
   m.Inflate(d);
   b.Inflate(d);
-  EXPECT_TRUE(b.IsContaining(m.GetLow()));
-  RKMPolyBoxf unit(1.0f, 1.0f, 1.0f, 1.0f, 1.0f, 1.0f);
   unit.Inflate(1.0 + 1e-9);
+  EXPECT_TRUE(b.IsContaining(m.GetLow()));
   EXPECT_LE(unit.GetXMin(), -1e-9);
 }
 
+// Every way to an empty box gives the same six values, whatever the box held before, and an empty box
+// answers nothing. Bounds from doubles are stepped outward, from floats kept.
 TEST(RKMPolyBoxfValues, CanonicalEmptyAndExactBitPatterns)
 {
   const RKMPolyBoxf b(0.0, 1.0, 0.0, 1.0, 0.0, 1.0), negZero(-0.0, -0.0, 0.0, 0.0, 0.0, 0.0);
-  EXPECT_EQ(Bits(b.GetXMin()), 0x80000001u);
-  EXPECT_EQ(Bits(b.GetXMax()), 0x3F800001u);
-  EXPECT_EQ(Bits(negZero.GetXMin()), 0x80000001u);
-  EXPECT_EQ(Bits(negZero.GetXMax()), 0x00000001u);
-  const RKMPolyBoxf f(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f);
-  EXPECT_EQ(Bits(f.GetXMin()), 0u);
-  EXPECT_EQ(Bits(f.GetZMax()), 0x3F800000u);
-
-  // Every way to an empty box gives the same six values, whatever the box held before. Pointers,
-  // because copying is itself one of the ways.
-  const RKMPolyBoxf inverted(2.0f, 1.0f, 5.0f, 6.0f, 7.0f, 8.0f), byDefault, fromMath{RKMMathBox()};
-  const RKMPolyBoxf copied(inverted);
+  EXPECT_TRUE(Bits(b.GetXMin()) == 0x80000001u && Bits(b.GetXMax()) == 0x3F800001u);
+  EXPECT_TRUE(Bits(negZero.GetXMin()) == 0x80000001u && Bits(negZero.GetXMax()) == 0x00000001u);
+  const RKMPolyBoxf f(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f), inverted(2.0f, 1.0f, 5.0f, 6.0f, 7.0f, 8.0f);
+  EXPECT_TRUE(Bits(f.GetXMin()) == 0u && Bits(f.GetZMax()) == 0x3F800000u);
+  // Pointers, because copying is itself one of the ways.
+  const RKMPolyBoxf byDefault, fromMath{RKMMathBox()}, copied(inverted);
   RKMPolyBoxf cleared(f), fromEmpty(f);
   cleared.SetToEmpty();
   fromEmpty.SetBox(RKMMathBox());
-  for (const RKMPolyBoxf *e : {&byDefault, &fromMath, &copied, static_cast<const RKMPolyBoxf *>(&cleared),
-                               static_cast<const RKMPolyBoxf *>(&fromEmpty)})
+  for (const RKMPolyBoxf *x : {&byDefault, &fromMath, &copied, &std::as_const(cleared), &std::as_const(fromEmpty)})
   {
-    float fl[3], fh[3];
-    Bounds(*e, fl, fh);
+    const RKMPolyBoxf &e = *x;
+    float fl[3], fh[3], fo[6] = {7, 7, 7, 7, 7, 7};
+    double dout[6] = {7, 7, 7, 7, 7, 7};
+    Bounds(e, fl, fh);
     for (int i = 0; i < 3; ++i)
       EXPECT_TRUE(Bits(fl[i]) == 0x3F800000u && Bits(fh[i]) == 0xBF800000u);
-    EXPECT_TRUE(e->IsEmpty());
-    float fo[6] = {7, 7, 7, 7, 7, 7};
-    double dout[6] = {7, 7, 7, 7, 7, 7};
-    EXPECT_LT(e->GetLimits(fo[0], fo[1], fo[2], fo[3], fo[4], fo[5]), 0);
-    EXPECT_EQ(e->GetLimits(dout[0], dout[1], dout[2], dout[3], dout[4], dout[5]), E_FAIL);
-    for (int i = 0; i < 6; ++i)
-      EXPECT_TRUE(fo[i] == 7.0f && dout[i] == 7.0);
-    EXPECT_EQ(e->Volume(), 0.0);
+    EXPECT_TRUE(e.IsEmpty() && e.Volume() == 0.0);
+    EXPECT_LT(e.GetLimits(fo[0], fo[1], fo[2], fo[3], fo[4], fo[5]), 0);
+    EXPECT_EQ(e.GetLimits(dout[0], dout[1], dout[2], dout[3], dout[4], dout[5]), E_FAIL);
+    EXPECT_TRUE(std::all_of(fo, fo + 6, [](float v) { return v == 7; }) &&
+                std::all_of(dout, dout + 6, [](double v) { return v == 7; }));
   }
   EXPECT_EQ(RKMPolyBoxf(0.0f, 1.0f, 0.0f, 2.0f, 0.0f, 3.0f).Volume(), 6.0);
 }
 
 TEST(RKMPolyBoxfValues, AddInsideUnionAndInflateOnExactValues)
 {
-  RKMPolyBoxf p;
+  RKMPolyBoxf p, q, u;
   p.AddInside(RKMMathPoint(2.0, 2.0, 2.0));
   EXPECT_TRUE(p.GetXMin() == Down(2.0f) && p.GetZMax() == Up(2.0f));
   const RKMPolyBoxf once = p;
   p.AddInside(RKMMathPoint(2.0, 2.0, 2.0));
-  EXPECT_EQ(std::memcmp(&once, &p, sizeof p), 0);
-  RKMPolyBoxf q;
+  EXPECT_TRUE(SameBits(once, p)) << "a point already held changes nothing";
   q.AddInside(RKMMathPointf(0.1f, -3.0f, 1e-40f));
   EXPECT_TRUE(q.GetXMin() == 0.1f && q.GetXMax() == 0.1f && q.GetYMin() == -3.0f && q.GetZMax() == 1e-40f);
-
   // On equal bounds the first box wins, which the sign of zero makes visible.
   const RKMPolyBoxf a(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f), b(-0.0f, 1.0f, 0.0f, 2.0f, -1.0f, 0.5f), empty;
-  RKMPolyBoxf u;
   u.SetToUnion(empty, empty);
   EXPECT_TRUE(u.IsEmpty());
   for (const RKMPolyBoxf *x : {&a, &b})
   {
     u.SetToUnion(*x, empty);
-    EXPECT_EQ(std::memcmp(&u, x, sizeof u), 0);
+    EXPECT_TRUE(SameBits(u, *x));
     u.SetToUnion(empty, *x);
-    EXPECT_EQ(std::memcmp(&u, x, sizeof u), 0);
+    EXPECT_TRUE(SameBits(u, *x));
   }
   u.SetToUnion(a, b);
-  EXPECT_EQ(Bits(u.GetXMin()), 0u);
-  EXPECT_TRUE(u.GetYMax() == 2.0f && u.GetZMin() == -1.0f && u.GetZMax() == 1.0f);
+  EXPECT_TRUE(Bits(u.GetXMin()) == 0u && u.GetYMax() == 2.0f && u.GetZMin() == -1.0f && u.GetZMax() == 1.0f);
   u.SetToUnion(b, a);
   EXPECT_EQ(Bits(u.GetXMin()), 0x80000000u);
-
+  // Inflating by 0 still steps every bound outward.
   RKMPolyBoxf g(1.0f, 2.0f, -3.0f, 0.0f, 1e-30f, FLT_MAX);
   g.Inflate(0.0);
   EXPECT_TRUE(g.GetXMin() == Down(1.0f) && g.GetXMax() == Up(2.0f) && g.GetYMin() == Down(-3.0f));
-  EXPECT_EQ(Bits(g.GetYMax()), 0x00000001u);
-  EXPECT_TRUE(g.GetZMin() == Down(1e-30f) && g.GetZMax() == kInfF);
+  EXPECT_TRUE(Bits(g.GetYMax()) == 0x00000001u && g.GetZMin() == Down(1e-30f) && g.GetZMax() == kInfF);
 }
 
 TEST(RKMPolyBoxfValues, InfinityAndNaNNeverLoseGeometry)
@@ -266,9 +242,9 @@ TEST(RKMPolyBoxfValues, InfinityAndNaNNeverLoseGeometry)
     inf.Inflate(d);
     EXPECT_TRUE(inf.GetXMin() == -kInfF && inf.GetYMax() == kInfF) << "d " << d;
   }
-
   // A NaN bound, coordinate or distance opens its side(s) instead of poisoning comparisons.
-  RKMPolyBoxf f(kNaNF, 1.0f, 0.0f, kNaNF, 0.0f, 1.0f), s, dn(kNaN, 1.0, 0.0, kNaN, 0.0, 1.0);
+  RKMPolyBoxf f(kNaNF, 1.0f, 0.0f, kNaNF, 0.0f, 1.0f), s, dn(kNaN, 1.0, 0.0, kNaN, 0.0, 1.0),
+      n(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f);
   s.SetExtremities(0.0f, 1.0f, kNaNF, kNaNF, 0.0f, 1.0f);
   EXPECT_TRUE(f.GetXMin() == -kInfF && f.GetYMax() == kInfF && f.GetXMax() == 1.0f);
   EXPECT_TRUE(s.GetYMin() == -kInfF && s.GetYMax() == kInfF && s.GetZMax() == 1.0f);
@@ -277,83 +253,78 @@ TEST(RKMPolyBoxfValues, InfinityAndNaNNeverLoseGeometry)
   {
     RKMPolyBoxf p, pf;
     if (!startEmpty)
-      p = pf = RKMPolyBoxf(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f);
+      p = pf = n;
     p.AddInside(RKMMathPoint(0.5, kNaN, 0.5));
     pf.AddInside(RKMMathPointf(0.5f, kNaNF, 0.5f));
     for (const RKMPolyBoxf &x : {p, pf})
-    {
-      EXPECT_TRUE(x.GetYMin() == -kInfF && x.GetYMax() == kInfF) << startEmpty;
-      EXPECT_TRUE(!x.IsEmpty() && x.IsContaining(RKMMathPoint(0.5, 1e300, 0.5))) << startEmpty;
-    }
+      EXPECT_TRUE(x.GetYMin() == -kInfF && x.GetYMax() == kInfF && !x.IsEmpty() &&
+                  x.IsContaining(RKMMathPoint(0.5, 1e300, 0.5)))
+          << startEmpty;
   }
-  RKMPolyBoxf n(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f);
   n.Inflate(kNaN);
   Bounds(n, bl, bh);
   for (int i = 0; i < 3; ++i)
     EXPECT_TRUE(bl[i] == -kInfF && bh[i] == kInfF) << i;
-
   const RKMPolyBoxf near(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f), far(5.0f, 6.0f, 5.0f, 6.0f, 5.0f, 6.0f);
-  EXPECT_TRUE(near.IsIntersecting(far, kNaNF));
-  EXPECT_TRUE(near.FastIsIntersecting(far, kNaNF));
-  EXPECT_TRUE(near.IsIntersecting(RKMMathBox(5, 6, 5, 6, 5, 6), kNaN));
+  EXPECT_TRUE(near.IsIntersecting(far, kNaNF) && near.FastIsIntersecting(far, kNaNF) &&
+              near.IsIntersecting(RKMMathBox(5, 6, 5, 6, 5, 6), kNaN));
 }
 
 TEST(RKMPolyBoxfOverlap, EdgeCasesAndMathBoxToleranceRounding)
 {
-  const RKMPolyBoxf unit(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f), neighbour(1.0f, 2.0f, 0.0f, 1.0f, 0.0f, 1.0f);
-  EXPECT_TRUE(unit.IsIntersecting(neighbour, 0.0f));
-  const RKMPolyBoxf empty, wide(-2.0f, 2.0f, -2.0f, 2.0f, -2.0f, 2.0f);
-  EXPECT_TRUE(wide.FastIsIntersecting(empty));
+  const RKMPolyBoxf unit(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f), neighbour(1.0f, 2.0f, 0.0f, 1.0f, 0.0f, 1.0f), empty,
+      wide(-2.0f, 2.0f, -2.0f, 2.0f, -2.0f, 2.0f);
+  EXPECT_TRUE(unit.IsIntersecting(neighbour, 0.0f) && wide.FastIsIntersecting(empty));
   EXPECT_FALSE(wide.IsIntersecting(empty, 0.0f) || empty.IsIntersecting(wide, 0.0f));
-  EXPECT_FALSE(unit.UltraFastIsIntersecting(static_cast<Order>(6), unit));
-  EXPECT_FALSE(unit.UltraFastIsIntersecting(static_cast<Order>(7), unit));
-
-  // The math box side is rounded to nearest, neither stepped nor truncated: 1 + 2^-25 rounds to 1
-  // and touches, 1 + 2^-23 is the next float and stays apart unless the tolerance closes the gap,
-  // and a tiny negative max rounds to -0 and touches.
-  EXPECT_TRUE(unit.IsIntersecting(RKMMathBox(1.0 + 0x1p-25, 2.0, 0, 1, 0, 1), 0.0));
-  EXPECT_FALSE(unit.IsIntersecting(RKMMathBox(1.0 + 0x1p-23, 2.0, 0, 1, 0, 1), 0.0));
-  EXPECT_TRUE(unit.IsIntersecting(RKMMathBox(1.0 + 0x1p-23, 2.0, 0, 1, 0, 1), 0x1p-23));
-  EXPECT_TRUE(unit.IsIntersecting(RKMMathBox(-1.0, -1e-50, 0, 1, 0, 1), 0.0));
-  EXPECT_FALSE(unit.IsIntersecting(RKMMathBox(-1.0, -1e-10, 0, 1, 0, 1), 0.0));
+  EXPECT_FALSE(unit.UltraFastIsIntersecting(static_cast<Order>(6), unit) ||
+               unit.UltraFastIsIntersecting(static_cast<Order>(7), unit));
+  // The math box side is rounded to nearest, neither stepped nor truncated: 1 + 2^-25 rounds to 1 and
+  // touches, 1 + 2^-23 is the next float and stays apart unless the tolerance closes the gap, and a
+  // tiny negative max rounds to -0 and touches.
+  const struct
+  {
+    double lo, hi, tol;
+    bool meets;
+  } cases[] = {{1.0 + 0x1p-25, 2.0, 0.0, true},
+               {1.0 + 0x1p-23, 2.0, 0.0, false},
+               {1.0 + 0x1p-23, 2.0, 0x1p-23, true},
+               {-1.0, -1e-50, 0.0, true},
+               {-1.0, -1e-10, 0.0, false}};
+  for (const auto &c : cases)
+    EXPECT_EQ(unit.IsIntersecting(RKMMathBox(c.lo, c.hi, 0, 1, 0, 1), c.tol) != 0, c.meets) << c.lo << " " << c.hi;
   EXPECT_FALSE(unit.IsIntersecting(RKMMathBox(), kInf));
 }
 
+// Axes sorted by extent, ties kept in order: extents 1..3 per axis cover every permutation and every
+// kind of tie, with different origins per axis, so the extents and not the coordinates decide.
 TEST(RKMPolyBoxfOverlap, AxisTestOrderSortsByExtentWithStableTies)
 {
-  EXPECT_EQ(RKMPolyBoxf(0.0f, 1.0f, 0.0f, 1.0f, 0.0f, 1.0f).GetAxisTestOrder(), RKMPolyBoxf::OrderXYZ);
-  EXPECT_EQ(RKMPolyBoxf(0.0f, 3.0f, 0.0f, 1.0f, 0.0f, 2.0f).GetAxisTestOrder(), RKMPolyBoxf::OrderYZX);
-  EXPECT_EQ(RKMPolyBoxf(0.0f, 1.0f, 0.0f, 3.0f, 0.0f, 2.0f).GetAxisTestOrder(), RKMPolyBoxf::OrderXZY);
-  // Extents 1..3 per axis cover every permutation and every kind of tie.
   const int kPerm[6][3] = {{0, 1, 2}, {0, 2, 1}, {1, 0, 2}, {1, 2, 0}, {2, 0, 1}, {2, 1, 0}};
   for (int code = 0; code < 27; ++code)
   {
     const float e[3] = {float(1 + code % 3), float(1 + code / 3 % 3), float(1 + code / 9)};
-    int axes[3] = {0, 1, 2};
+    int axes[3] = {0, 1, 2}, expected = 0;
     std::stable_sort(axes, axes + 3, [&](int i, int j) { return e[i] < e[j]; });
-    int expected = 0;
     while (!std::equal(axes, axes + 3, kPerm[expected]))
       ++expected;
-    // Different origins per axis, so the extents and not the coordinates decide.
     const RKMPolyBoxf b(-5.0f, e[0] - 5.0f, 7.0f, e[1] + 7.0f, -0.5f, e[2] - 0.5f);
     EXPECT_EQ(b.GetAxisTestOrder(), expected) << e[0] << " " << e[1] << " " << e[2];
   }
 }
 
+// A coarse grid nudged by less than a float step, so boxes that touch or nearly touch in double hinge
+// on the rounding: every overlap test agrees with the float intervals, and none misses a double
+// overlap, with or without tolerance.
 TEST(RKMPolyBoxfOverlap, RandomPairsMatchIntervalOracleAndNeverMissDoubleOverlap)
 {
-  const unsigned seed = 777u;
-  SCOPED_TRACE("seed " + std::to_string(seed));
-  std::mt19937_64 rng(seed);
-  // A coarse grid nudged by less than a float step, so boxes that touch or nearly touch in double
-  // hinge on the rounding.
+  std::mt19937_64 rng(777u);
   const double kNudge[] = {0.0, 1e-9, -1e-9, 3e-8, -3e-8, 1e-30, -1e-30};
   std::uniform_int_distribution<int> grid(-4, 4), nudge(0, 6);
   auto coord = [&] { return 0.5 * grid(rng) + kNudge[nudge(rng)]; };
   const float kTol[] = {0.0f, 1e-9f, 0.25f, 1.0f};
   for (int iter = 0; iter < 20000; ++iter)
   {
-    SCOPED_TRACE("iteration " + std::to_string(iter));
+    SCOPED_TRACE("seed 777, iteration " + std::to_string(iter));
     double l[2][3], h[2][3];
     RKMPolyBoxf f[2];
     RKMMathBox m[2];
@@ -369,7 +340,6 @@ TEST(RKMPolyBoxfOverlap, RandomPairsMatchIntervalOracleAndNeverMissDoubleOverlap
     if (withEmpty)
       f[1] = RKMPolyBoxf(1.0f, 0.5f, 0.0f, 1.0f, 0.0f, 1.0f);
     const float tol = kTol[iter % 4];
-
     float fl[2][3], fh[2][3];
     Bounds(f[0], fl[0], fh[0]);
     Bounds(f[1], fl[1], fh[1]);

@@ -1,5 +1,6 @@
-// Runs with RKMPolyDebugStackTrace=1 and RKMPolyDebugStackTraceMask=9 (type mask 1, class mask 8) and
-// the test provider on the library path; see CMakeLists.txt.
+// Runs with RKMPolyDebugStackTrace=1 and RKMPolyDebugStackTraceMask=9 (type mask 1, class mask 8) and the
+// test provider on the library path; see CMakeLists.txt. Types 9 and 11 are traced; 5 has the type bit but
+// not the class bit, 8 the reverse, 2 neither.
 
 #include "RKMPolyDebugObjectTrace.h"
 #include "RKMPolyDebugStackTrace.h"
@@ -8,81 +9,69 @@
 #include "RuntimeTestSupport.h"
 #include "TraceProviderLog.h"
 
-#include <gtest/gtest.h>
-
-#include <cstdlib>
 #include <map>
 #include <string>
-#include <vector>
 
 #include <dlfcn.h>
 
 namespace
 {
-#define REQUIRE_TRACE_SETTINGS()                                                                            \
-  if (!RKMGetEnv("RKMPolyDebugStackTrace") || !RKMGetEnv("RKMPolyDebugStackTraceMask") ||                   \
-      std::atoi(RKMGetEnv("RKMPolyDebugStackTraceMask")) != 9)                                             \
+#define REQUIRE_TRACE_SETTINGS()                                                                                  \
+  if (!RKMGetEnv("RKMPolyDebugStackTrace") || !RKMGetEnv("RKMPolyDebugStackTraceMask") ||                         \
+      std::atoi(RKMGetEnv("RKMPolyDebugStackTraceMask")) != 9)                                                   \
   GTEST_SKIP() << "run through ctest, which sets the trace settings and the provider's path"
 
-// Moves the provider's log out. The library loads the provider privately (RTLD_LOCAL); opening it
-// again by the same name without loading gives that very instance.
+// Moves the provider's log out (loading the provider first, if no trace has). The library loads it
+// privately (RTLD_LOCAL); opening it again by the same name without loading gives that very instance.
 std::vector<TraceProviderRecord> TakeLog()
 {
+  RKMPolyDebugStackTrace::Initialize();
   std::vector<TraceProviderRecord> log;
   void *lib = dlopen("libPolyDebugStackTrace.so", RTLD_NOW | RTLD_NOLOAD);
   auto take = lib ? reinterpret_cast<TraceProviderTakeLogFn>(dlsym(lib, "TraceProviderTakeLog")) : nullptr;
   if (!take)
-  {
     ADD_FAILURE() << "the trace provider is not loaded";
-    return log;
-  }
   TraceProviderRecord chunk[256];
-  for (int n; (n = take(chunk, 256)) > 0;)
+  for (int n; take && (n = take(chunk, 256)) > 0;)
     log.insert(log.end(), chunk, chunk + n);
-  dlclose(lib);
+  if (lib)
+    dlclose(lib);
   return log;
 }
 
-void StartLog()
-{
-  RKMPolyDebugStackTrace::Initialize();
-  TakeLog();
-}
-
-// Every opened event is closed exactly once, after its open, through the entry that opened it, and
-// nothing else is closed. Gives the number of events opened.
+// Every opened event is closed exactly once, after its open, through the entry that opened it, and nothing
+// else is closed. Gives the number of events opened.
 int ExpectEachOpenClosedOnce(const std::vector<TraceProviderRecord> &log)
 {
-  std::map<long, size_t> openedAt;
-  std::map<long, int> closes;
-  for (size_t i = 0; i < log.size(); ++i)
+  std::map<long, std::pair<const TraceProviderRecord *, int>> events; // the open and the number of closes
+  for (const TraceProviderRecord &r : log)
   {
-    const TraceProviderRecord &r = log[i];
-    if (r.open)
-    {
-      EXPECT_TRUE(openedAt.emplace(r.handle, i).second) << "handle reused";
-      continue;
-    }
-    auto it = openedAt.find(r.handle);
-    if (it == openedAt.end())
-    {
-      ADD_FAILURE() << "record " << i << " closes event " << r.handle
-                    << " (-1: closed before, 0: bad call, other: not opened yet)";
-      continue;
-    }
-    EXPECT_EQ(r.fromObjectTrace, log[it->second].fromObjectTrace) << "closed through the other entry";
-    ++closes[r.handle];
+    auto &e = events[r.handle];
+    EXPECT_TRUE(r.open ? !e.first && (e.first = &r) : e.first && e.first->fromObjectTrace == r.fromObjectTrace && ++e.second)
+        << (r.open ? "reopens" : "closes, before its open or through the other entry,") << " event " << r.handle;
   }
-  for (const auto &o : openedAt)
-    EXPECT_EQ(closes[o.first], 1) << "event " << o.first << " (" << log[o.second].name << ")";
-  return static_cast<int>(openedAt.size());
+  int opened = 0;
+  for (const auto &e : events)
+    EXPECT_TRUE(e.second.first && e.second.second == 1 && ++opened)
+        << "event " << e.first << " (-1: closed before, 0: bad call) closed " << e.second.second << " times";
+  return opened;
 }
 
-// The first-use cases mean something only before any other trace: their suite is declared first, so
-// it runs first. An object trace made before any stack trace must still filter with the mask setting
-// (type 5 is not traced under mask 9), and reading the masks must not race with a stack trace reading
-// them on another thread.
-TEST(RKMPolyDebugTraceFirstUse, ObjectTraceHonoursTheMaskSetting)
+// The trace settings are in the environment and the provider's log is empty.
+class RKMPolyDebugTrace : public ::testing::Test
+{
+protected:
+  void SetUp() override
+  {
+    REQUIRE_TRACE_SETTINGS();
+    TakeLog();
+  }
+};
+
+// Declared first, so it runs first: an object trace made before any stack trace must still filter with the
+// mask setting. Then several threads trace at once: whichever reads the settings, under a once-flag, every
+// thread must see the loaded provider and the masks, and reading them must not race.
+TEST(RKMPolyDebugTraceFirstUse, SettingsReadOnceForObjectAndStackTracesOnAnyThread)
 {
   REQUIRE_TRACE_SETTINGS();
   rkmtest::Watchdog watchdog;
@@ -91,136 +80,71 @@ TEST(RKMPolyDebugTraceFirstUse, ObjectTraceHonoursTheMaskSetting)
     object.Construct("excluded by the mask", 5);
     EXPECT_FALSE(object.IsTracing());
   }
+  constexpr int kThreads = 6;
   std::atomic<int> wrong{0};
-  rkmtest::RunConcurrently(2, [&](int t) {
-    if (t == 1)
-    {
-      RKMPolyDebugStackTrace scope("scope", 9);
-      return;
-    }
+  rkmtest::RunConcurrently(kThreads, [&](int t) {
+    RKMPolyDebugStackTrace trace("first", 9);
     RKMPolyDebugObjectTrace object;
-    object.Construct("excluded by the mask", 5);
-    wrong += object.IsTracing();
+    object.Construct("excluded by the mask", t % 2 ? 5 : 8);
+    wrong += !trace.IsTracing() || object.IsTracing();
   });
   EXPECT_EQ(wrong.load(), 0);
+  EXPECT_TRUE(RKMPolyDebugStackTrace::s_TypeMask == 1 && RKMPolyDebugStackTrace::s_ClassMask == 8);
+  EXPECT_EQ(ExpectEachOpenClosedOnce(TakeLog()), kThreads);
 }
 
-// The settings are read under a once-flag by whichever thread comes first; every thread must see the
-// loaded provider and the masks.
-TEST(RKMPolyDebugTraceFirstUse, StackTracesFromSeveralThreads)
+// Copies hold no event; assignment neither takes the source's event nor drops the target's own. Scopes end
+// in reverse order, each closing its own event.
+TEST_F(RKMPolyDebugTrace, MaskSelectsTheTracedScopesAndOnlyTheirOwnersCloseThem)
 {
-  REQUIRE_TRACE_SETTINGS();
-  rkmtest::Watchdog watchdog;
-  constexpr int kThreads = 6;
-  std::atomic<int> tracing{0};
-  rkmtest::RunConcurrently(kThreads, [&](int) {
-    RKMPolyDebugStackTrace trace("first", 9);
-    tracing += trace.IsTracing();
-  });
-  EXPECT_EQ(tracing.load(), kThreads);
-  EXPECT_EQ(RKMPolyDebugStackTrace::s_TypeMask, 1);
-  EXPECT_EQ(RKMPolyDebugStackTrace::s_ClassMask, 8);
-  const std::vector<TraceProviderRecord> log = TakeLog();
-  ExpectEachOpenClosedOnce(log);
-  int opened = 0;
-  for (const TraceProviderRecord &r : log)
-    opened += r.open && std::string(r.name) == "first";
-  EXPECT_EQ(opened, kThreads);
-}
-
-TEST(RKMPolyDebugStackTrace, MaskSelectsTheTracedScopes)
-{
-  REQUIRE_TRACE_SETTINGS();
-  StartLog();
   {
-    RKMPolyDebugStackTrace nine("nine", 9), eleven("eleven", 11);
-    // 5 has the type bit but not the class bit, 8 the reverse, 2 neither.
-    RKMPolyDebugStackTrace five("five", 5), eight("eight", 8), two("two", 2);
-    EXPECT_TRUE(nine.IsTracing());
-    EXPECT_TRUE(eleven.IsTracing());
+    RKMPolyDebugStackTrace nine("nine", 9), eleven("eleven", 11), five("five", 5), eight("eight", 8), two("two", 2);
+    EXPECT_TRUE(nine.IsTracing() && eleven.IsTracing());
     EXPECT_FALSE(five.IsTracing() || eight.IsTracing() || two.IsTracing());
+    RKMPolyDebugStackTrace copy(nine);
+    std::vector<RKMPolyDebugStackTrace> copies(3, nine);
+    eleven = nine;
+    copy = eleven;
+    EXPECT_TRUE(eleven.IsTracing() && !copy.IsTracing() && !copies[0].IsTracing() && !copies[2].IsTracing());
   }
   const std::vector<TraceProviderRecord> log = TakeLog();
   ASSERT_EQ(log.size(), 4u);
-  EXPECT_STREQ(log[0].name, "nine");
-  EXPECT_EQ(log[0].type, 9);
-  EXPECT_STREQ(log[1].name, "eleven");
-  EXPECT_EQ(log[1].type, 11);
-  // Scopes end in reverse order, each closing its own event.
-  EXPECT_EQ(log[2].handle, log[1].handle);
-  EXPECT_EQ(log[3].handle, log[0].handle);
+  EXPECT_TRUE(log[0].type == 9 && std::string(log[0].name) == "nine");
+  EXPECT_TRUE(log[1].type == 11 && std::string(log[1].name) == "eleven");
+  EXPECT_TRUE(log[2].handle == log[1].handle && log[3].handle == log[0].handle);
   EXPECT_EQ(ExpectEachOpenClosedOnce(log), 2);
 }
 
-TEST(RKMPolyDebugStackTrace, CopiesHoldNoEvent)
+// Constructing again closes the open event before opening the next; copies hold none.
+TEST_F(RKMPolyDebugTrace, ObjectTraceConstructOpensThroughTheObjectEntry)
 {
-  REQUIRE_TRACE_SETTINGS();
-  StartLog();
-  std::vector<TraceProviderRecord> log;
-  {
-    RKMPolyDebugStackTrace original("original", 9);
-    {
-      RKMPolyDebugStackTrace copy(original);
-      std::vector<RKMPolyDebugStackTrace> copies(3, original);
-      EXPECT_FALSE(copy.IsTracing() || copies[0].IsTracing() || copies[2].IsTracing());
-      // Assignment neither takes the source's event nor drops the target's own.
-      RKMPolyDebugStackTrace other("other", 11);
-      other = original;
-      copy = other;
-      EXPECT_TRUE(other.IsTracing());
-      EXPECT_FALSE(copy.IsTracing());
-    }
-    log = TakeLog();
-    ASSERT_EQ(log.size(), 3u) << "only 'other' may be closed so far";
-    EXPECT_EQ(log[2].handle, log[1].handle);
-    EXPECT_TRUE(original.IsTracing());
-  }
-  const std::vector<TraceProviderRecord> rest = TakeLog();
-  log.insert(log.end(), rest.begin(), rest.end());
-  EXPECT_EQ(ExpectEachOpenClosedOnce(log), 2);
-}
-
-TEST(RKMPolyDebugObjectTrace, ConstructOpensThroughTheObjectEntry)
-{
-  REQUIRE_TRACE_SETTINGS();
-  StartLog();
   {
     RKMPolyDebugObjectTrace object;
     EXPECT_FALSE(object.IsTracing());
-    object.Construct("first", 9);
-    EXPECT_TRUE(object.IsTracing());
-    // Constructing again closes the open event before opening the next.
-    object.Construct("second", 11);
-    RKMPolyDebugObjectTrace copy(object);
-    EXPECT_FALSE(copy.IsTracing());
-    copy = object;
-    EXPECT_FALSE(copy.IsTracing());
-    object.Construct("untraced", 5);
-    EXPECT_FALSE(object.IsTracing());
-    object.Construct("last", 9);
-    EXPECT_TRUE(object.IsTracing());
+    const std::pair<const char *, int> constructs[] = {{"first", 9}, {"second", 11}, {"untraced", 5}, {"last", 9}};
+    for (const auto &c : constructs)
+    {
+      object.Construct(c.first, c.second);
+      EXPECT_EQ(object.IsTracing(), c.second != 5) << c.first;
+      RKMPolyDebugObjectTrace copy(object), assigned;
+      assigned = object;
+      EXPECT_FALSE(copy.IsTracing() || assigned.IsTracing());
+    }
   }
   const std::vector<TraceProviderRecord> log = TakeLog();
   ASSERT_EQ(log.size(), 6u);
   const char *opened[] = {"first", nullptr, "second", nullptr, "last", nullptr};
   for (size_t i = 0; i < log.size(); ++i)
-  {
-    EXPECT_EQ(log[i].fromObjectTrace, 1) << i;
-    EXPECT_EQ(log[i].open != 0, opened[i] != nullptr) << i;
-    EXPECT_STREQ(log[i].open ? log[i].name : nullptr, opened[i]) << i;
-  }
+    EXPECT_TRUE(log[i].fromObjectTrace == 1 && (log[i].open ? opened[i] && std::string(log[i].name) == opened[i] : !opened[i])) << i;
   EXPECT_EQ(ExpectEachOpenClosedOnce(log), 3);
 }
 
-// Nested scopes, copies and object traces on several threads at once: each event is closed once, by
-// its owner, whatever the interleaving.
-TEST(RKMPolyDebugStackTrace, ConcurrentScopesCloseEachEventOnce)
+// Nested scopes, copies and object traces on several threads at once: each event is closed once, by its
+// owner, whatever the interleaving.
+TEST_F(RKMPolyDebugTrace, ConcurrentScopesCloseEachEventOnce)
 {
-  REQUIRE_TRACE_SETTINGS();
   rkmtest::Watchdog watchdog;
-  StartLog();
-  constexpr int kThreads = 4;
-  constexpr int kRounds = 300;
+  constexpr int kThreads = 4, kRounds = 300;
   std::atomic<int> wrong{0};
   rkmtest::RunConcurrently(kThreads, [&](int t) {
     for (int r = 0; r < kRounds; ++r)
@@ -229,8 +153,7 @@ TEST(RKMPolyDebugStackTrace, ConcurrentScopesCloseEachEventOnce)
       RKMPolyDebugObjectTrace object;
       object.Construct("object", 9);
       RKMPolyDebugObjectTrace objectCopy(object);
-      wrong += !outer.IsTracing() || copy.IsTracing() || skipped.IsTracing() || !object.IsTracing() ||
-               objectCopy.IsTracing();
+      wrong += !outer.IsTracing() || copy.IsTracing() || skipped.IsTracing() || !object.IsTracing() || objectCopy.IsTracing();
     }
   });
   EXPECT_EQ(wrong.load(), 0);

@@ -7,12 +7,9 @@
 
 #include "RuntimeTestSupport.h"
 
-#include <gtest/gtest.h>
-
-#include <atomic>
+#include <algorithm>
 #include <climits>
 #include <utility>
-#include <vector>
 
 namespace
 {
@@ -29,75 +26,53 @@ private:
   std::atomic<int> *m_deaths;
 };
 
+// Had the copy or assignment carried a's count over, a release would delete too early or never.
 TEST(RKMRefCounted, CountsCopiesAndAssignment)
 {
   std::atomic<int> deaths{0};
-  Counted *a = new Counted(&deaths);
-  EXPECT_EQ(a->GetRefCount(), 1);
-  EXPECT_EQ(a->AddRef(), 2);
-  EXPECT_EQ(a->AddRef(), 3);
+  Counted *a = new Counted(&deaths), *target = new Counted(&deaths);
+  EXPECT_TRUE(a->GetRefCount() == 1 && a->AddRef() == 2 && target->AddRef() == 2);
   Counted *copy = new Counted(*a);
-  Counted *target = new Counted(&deaths);
-  target->AddRef();
   *target = *a;
-  EXPECT_EQ(copy->GetRefCount(), 1);
-  EXPECT_EQ(target->GetRefCount(), 2);
-  EXPECT_EQ(a->GetRefCount(), 3);
-
-  // Had the copy or assignment carried a's count over, one of these would delete too early or never.
-  EXPECT_EQ(copy->Release(), 0);
-  EXPECT_EQ(target->Release(), 1);
-  EXPECT_EQ(target->Release(), 0);
-  EXPECT_EQ(deaths.load(), 2);
-  EXPECT_EQ(a->Release(), 2);
-  EXPECT_EQ(a->Release(), 1);
-  EXPECT_EQ(deaths.load(), 2);
-  EXPECT_EQ(a->Release(), 0);
-  EXPECT_EQ(deaths.load(), 3);
+  EXPECT_TRUE(copy->GetRefCount() == 1 && target->GetRefCount() == 2 && a->GetRefCount() == 2);
+  EXPECT_TRUE(copy->Release() == 0 && target->Release() == 1 && target->Release() == 0 && deaths.load() == 2);
+  EXPECT_TRUE(a->Release() == 1 && deaths.load() == 2 && a->Release() == 0 && deaths.load() == 3);
 }
 
-// Each holder owns exactly one reference: Adopt takes the caller's, Share and copies add one, moves
-// pass it on, and the object dies once, with the last reference.
+// Each holder owns exactly one reference: Adopt takes the caller's, Share and copies add one, moves pass it
+// on, and the object dies once, with the last reference.
 TEST(RKMRef, HoldsOneReferenceEach)
 {
   std::atomic<int> deaths{0};
   {
     const RKMRef<Counted> a = RKMRef<Counted>::Adopt(new Counted(&deaths));
     EXPECT_EQ(a->GetRefCount(), 1);
-    RKMRef<Counted> shared = RKMRef<Counted>::Share(a.Get()), copy(a);
+    RKMRef<Counted> shared = RKMRef<Counted>::Share(a.Get()), copy(a), other = RKMRef<Counted>::Adopt(new Counted(&deaths));
     EXPECT_EQ((*a).GetRefCount(), 3);
-    RKMRef<Counted> other = RKMRef<Counted>::Adopt(new Counted(&deaths));
-    other = copy;  // releases the other object, its only reference
-    EXPECT_EQ(deaths.load(), 1);
-    EXPECT_EQ(a->GetRefCount(), 4);
+    other = copy; // releases the other object, its only reference
+    EXPECT_TRUE(deaths.load() == 1 && a->GetRefCount() == 4);
     RKMRef<Counted> moved(std::move(copy));
     other = std::move(shared);
-    EXPECT_TRUE(!copy && !shared && moved && other);
-    EXPECT_EQ(moved.Get(), a.Get());
-    EXPECT_EQ(a->GetRefCount(), 3);
+    EXPECT_TRUE(!copy && !shared && moved && other && moved.Get() == a.Get() && a->GetRefCount() == 3);
     const RKMRef<Counted> &alias = other;
     other = alias;
-    EXPECT_EQ(other.Get(), a.Get());
-    EXPECT_EQ(a->GetRefCount(), 3);
+    EXPECT_TRUE(other.Get() == a.Get() && a->GetRefCount() == 3);
     other.Reset();
     EXPECT_EQ(a->GetRefCount(), 2);
     RKMRef<Counted> detached = moved;
     Counted *raw = detached.Detach();
-    EXPECT_FALSE(detached);
-    EXPECT_EQ(raw->Release(), 2);
-
+    EXPECT_TRUE(!detached && raw->Release() == 2);
     RKMRef<Counted> none, nullAdopted = RKMRef<Counted>::Adopt(nullptr), nullShared = RKMRef<Counted>::Share(nullptr);
     EXPECT_TRUE(!none && !nullAdopted && !nullShared && none.Get() == nullptr && none.Detach() == nullptr);
     none.Reset();
     moved.Reset();
-    EXPECT_EQ(a->GetRefCount(), 1);
-    EXPECT_EQ(deaths.load(), 1);
+    EXPECT_TRUE(a->GetRefCount() == 1 && deaths.load() == 1);
   }
   EXPECT_EQ(deaths.load(), 2);
 }
 
-// Every thread owns one reference and churns extra ones; a lost increment deletes the object while
-// others still use it, a lost decrement leaks it.
+// Every thread owns one reference and churns extra ones; a lost increment deletes the object while others
+// still use it, a lost decrement leaks it.
 TEST(RKMRefCounted, ConcurrentAddRefReleaseNeverLosesACount)
 {
   rkmtest::Watchdog watchdog;
@@ -111,81 +86,60 @@ TEST(RKMRefCounted, ConcurrentAddRefReleaseNeverLosesACount)
       early += c->AddRef() < 2 || c->Release() < 1 || deaths.load() != 0;
     zeroes += c->Release() == 0;
   });
-  EXPECT_EQ(early.load(), 0);
-  EXPECT_EQ(zeroes.load(), 1);
-  EXPECT_EQ(deaths.load(), 1);
+  EXPECT_TRUE(early.load() == 0 && zeroes.load() == 1 && deaths.load() == 1);
 }
 
+// Increment and Decrement give the new word, the others the old one; a failed CompareAndSwap changes
+// nothing, nor does resetting a clear bit; the sign bit is an ordinary bit. The rest is checked below.
 TEST(RKMPolyAtomicOperations, GiveTheDocumentedValues)
 {
+  using Ops = RKMPolyAtomicOperations;
   int w = 5;
-  EXPECT_EQ(RKMPolyAtomicOperations::Increment(&w), 6);
-  EXPECT_EQ(RKMPolyAtomicOperations::Decrement(&w), 5);
-  EXPECT_EQ(RKMPolyAtomicOperations::CompareAndSwap(&w, 9, 3), 5);
-  EXPECT_EQ(w, 5);
-  EXPECT_EQ(RKMPolyAtomicOperations::CompareAndSwap(&w, 9, 5), 5);
-  EXPECT_EQ(w, 9);
-  w = 0x10;
-  EXPECT_EQ(RKMPolyAtomicOperations::BitWiseOr(&w, 0x3), 0x10);
-  EXPECT_EQ(w, 0x13);
-  w = 7;
-  EXPECT_EQ(RKMPolyAtomicOperations::BitWiseTestAndReset(&w, 4), 7);
-  EXPECT_EQ(w, 3);
-  EXPECT_EQ(RKMPolyAtomicOperations::BitWiseTestAndReset(&w, 4), 3);
-  EXPECT_EQ(w, 3);
-  // The sign bit is an ordinary bit for the bitwise operations.
+  EXPECT_TRUE(Ops::Increment(&w) == 6 && Ops::Decrement(&w) == 5);
+  EXPECT_TRUE(Ops::CompareAndSwap(&w, 9, 3) == 5 && w == 5 && Ops::CompareAndSwap(&w, 9, 5) == 5 && w == 9);
+  w = 3;
+  EXPECT_TRUE(Ops::BitWiseTestAndReset(&w, 4) == 3 && w == 3);
   w = 0;
-  EXPECT_EQ(RKMPolyAtomicOperations::BitWiseOr(&w, INT_MIN), 0);
-  EXPECT_EQ(RKMPolyAtomicOperations::BitWiseTestAndReset(&w, INT_MIN), INT_MIN);
-  EXPECT_EQ(w, 0);
+  EXPECT_TRUE(Ops::BitWiseOr(&w, INT_MIN) == 0 && Ops::BitWiseTestAndReset(&w, INT_MIN) == INT_MIN && w == 0);
 }
 
-// Threads set, clear and set again their own bit in each of many shared words, and count with
-// Increment and with a CompareAndSwap retry loop: a read-modify-write that is not atomic drops a
-// neighbour's bit or an increment.
+// Threads set, clear and set again their own bit in each of many shared words, and count with Increment and
+// with a CompareAndSwap retry loop: a read-modify-write that is not atomic drops a neighbour's bit or a count.
 TEST(RKMPolyAtomicOperations, ConcurrentUpdatesLoseNothing)
 {
+  using Ops = RKMPolyAtomicOperations;
   rkmtest::Watchdog watchdog;
-  constexpr int kThreads = 8;
-  constexpr int kWords = rkmtest::Rounds(40000);
+  constexpr int kThreads = 8, kWords = rkmtest::Rounds(40000);
   std::vector<int> words(kWords, 0);
-  int counter = 0, casCounter = 0;
+  int counter = 0, casCounter = 0, all = 0;
   std::atomic<int> wrongBefore{0};
   rkmtest::RunConcurrently(kThreads, [&](int t) {
     const int bit = 1 << (t * 3);
     for (int &w : words)
     {
-      wrongBefore += (RKMPolyAtomicOperations::BitWiseOr(&w, bit) & bit) != 0;
-      RKMPolyAtomicOperations::Increment(&counter);
-      int seen = RKMPolyAtomicOperations::CompareAndSwap(&casCounter, 0, 0);
-      for (int before; (before = RKMPolyAtomicOperations::CompareAndSwap(&casCounter, seen + 1, seen)) != seen;)
+      wrongBefore += (Ops::BitWiseOr(&w, bit) & bit) != 0;
+      Ops::Increment(&counter);
+      for (int seen = Ops::CompareAndSwap(&casCounter, 0, 0), before; (before = Ops::CompareAndSwap(&casCounter, seen + 1, seen)) != seen;)
         seen = before;
     }
     for (int &w : words)
-      wrongBefore += (RKMPolyAtomicOperations::BitWiseTestAndReset(&w, bit) & bit) == 0;
+      wrongBefore += (Ops::BitWiseTestAndReset(&w, bit) & bit) == 0;
     for (int &w : words)
-      RKMPolyAtomicOperations::BitWiseOr(&w, bit << 2);
+      Ops::BitWiseOr(&w, bit << 2);
   });
-  EXPECT_EQ(wrongBefore.load(), 0);
-  EXPECT_EQ(counter, kThreads * kWords);
-  EXPECT_EQ(casCounter, kThreads * kWords);
-  int all = 0;
+  EXPECT_TRUE(wrongBefore.load() == 0 && counter == kThreads * kWords && casCounter == kThreads * kWords);
   for (int t = 0; t < kThreads; ++t)
     all |= 1 << (t * 3 + 2);
-  int bad = 0;
-  for (int w : words)
-    bad += w != all;
-  EXPECT_EQ(bad, 0);
+  EXPECT_EQ(std::count(words.begin(), words.end(), all), kWords);
 }
 
-// A plain read-modify-write of a plain counter is exact only under mutual exclusion; the "inside"
-// count catches two holders at once even when their increments happen not to collide, and
-// ThreadSanitizer sees a lock without the right barriers.
+// A plain read-modify-write of a plain counter is exact only under mutual exclusion; the "inside" count
+// catches two holders at once even when their increments happen not to collide, and ThreadSanitizer sees a
+// lock without the right barriers.
 template <class Enter>
 void ExpectMutualExclusion(const char *what, const Enter &enterAndRun)
 {
-  constexpr int kThreads = 6;
-  constexpr int kRounds = rkmtest::Rounds(100000);
+  constexpr int kThreads = 6, kRounds = rkmtest::Rounds(100000);
   long counter = 0;
   std::atomic<int> inside{0}, overlaps{0};
   rkmtest::RunConcurrently(kThreads, [&](int) {
@@ -197,14 +151,15 @@ void ExpectMutualExclusion(const char *what, const Enter &enterAndRun)
         inside.fetch_sub(1);
       });
   });
-  EXPECT_EQ(overlaps.load(), 0) << what;
-  EXPECT_EQ(counter, long(kThreads) * kRounds) << what;
+  EXPECT_TRUE(overlaps.load() == 0 && counter == long(kThreads) * kRounds) << what;
 }
 
+// The mutex is recursive: a nested scope on the same thread must neither block nor release early.
 TEST(RKMPolySpinLockMutex, ExcludesAloneAndThroughScopedMutex)
 {
   rkmtest::Watchdog watchdog;
   RKMPolySpinLockMutex spin;
+  RKMMutex mutex;
   ExpectMutualExclusion("Lock/Unlock", [&](const auto &critical) {
     spin.Lock();
     critical();
@@ -214,13 +169,9 @@ TEST(RKMPolySpinLockMutex, ExcludesAloneAndThroughScopedMutex)
     RKMPolyScopedMutex hold(spin);
     critical();
   });
-  RKMMutex mutex;
   ExpectMutualExclusion("scoped mutex", [&](const auto &critical) {
     RKMPolyScopedMutex outer(mutex);
-    // The mutex is recursive: a nested scope on the same thread must neither block nor release early.
-    {
-      RKMPolyScopedMutex inner(mutex);
-    }
+    RKMPolyScopedMutex{mutex}; // a nested scope
     critical();
   });
 }

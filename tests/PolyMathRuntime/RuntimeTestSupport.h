@@ -4,11 +4,10 @@
 
 #include <atomic>
 #include <chrono>
-#include <condition_variable>
 #include <cstdio>
 #include <cstdlib>
 #include <functional>
-#include <mutex>
+#include <future>
 #include <thread>
 #include <vector>
 
@@ -25,42 +24,25 @@ constexpr int Rounds(int plain)
 #endif
 }
 
-// A deadlock in the code under test must fail the run, not stall it: past the deadline the process
-// aborts with the name of the test that hung.
+// A deadlock in the code under test must fail the run, not stall it: past the deadline the process aborts.
 class Watchdog
 {
 public:
   explicit Watchdog(std::chrono::seconds limit = std::chrono::seconds(30))
-      : m_thread([this, limit] {
-          std::unique_lock<std::mutex> lock(m_mutex);
-          if (!m_cv.wait_for(lock, limit, [this] { return m_done; }))
-          {
-            const ::testing::TestInfo *info = ::testing::UnitTest::GetInstance()->current_test_info();
-            std::fprintf(stderr, "Watchdog: %s.%s still running after %lld s, aborting\n",
-                         info ? info->test_suite_name() : "?", info ? info->name() : "?",
-                         static_cast<long long>(limit.count()));
-            std::fflush(stderr);
-            std::abort();
-          }
+      : m_thread([limit, done = m_done.get_future()] {
+          if (done.wait_for(limit) != std::future_status::ready)
+            std::fprintf(stderr, "Watchdog: the test still runs after %lld s\n", static_cast<long long>(limit.count())), std::abort();
         })
   {
   }
-  Watchdog(const Watchdog &) = delete;
-  Watchdog &operator=(const Watchdog &) = delete;
   ~Watchdog()
   {
-    {
-      std::lock_guard<std::mutex> lock(m_mutex);
-      m_done = true;
-    }
-    m_cv.notify_one();
+    m_done.set_value();
     m_thread.join();
   }
 
 private:
-  std::mutex m_mutex;
-  std::condition_variable m_cv;
-  bool m_done = false;
+  std::promise<void> m_done;
   std::thread m_thread;
 };
 
@@ -70,11 +52,9 @@ inline void RunConcurrently(int n, const std::function<void(int)> &body)
 {
   std::atomic<int> ready{0};
   std::vector<std::thread> threads;
-  threads.reserve(static_cast<size_t>(n));
   for (int i = 0; i < n; ++i)
     threads.emplace_back([&, i] {
-      ready.fetch_add(1);
-      while (ready.load() < n)
+      for (ready.fetch_add(1); ready.load() < n;)
         std::this_thread::yield();
       body(i);
     });

@@ -45,25 +45,27 @@ struct Random
 };
 } // namespace
 
+// Singularity is relative: rotation · diagonal of magnitudes in [1, 10] · rotation (condition number at
+// most 10) inverts at any scale; determinants of 1e-330 or 1e360 leave the double range unless the
+// matrix is scaled first.
 TEST(RKMMath3x3Matrix, InverseOfRandomMatricesAtAnyScale)
 {
-  const unsigned seed = 31337;
-  SCOPED_TRACE("seed " + std::to_string(seed));
-  Random r{std::mt19937(seed)};
+  Random r{std::mt19937(31337)};
   for (int n = 0; n < 201; ++n)
   {
-    // Rotation · diagonal of magnitudes in [1, 10] · rotation: condition number at most 10.
     const M d(1 + 9 * std::fabs(r.u(r.rng)), 0, 0, 0, 1 + 9 * std::fabs(r.u(r.rng)), 0, 0, 0, -1);
-    const M m = Scaled(r.Rot() * d * r.Rot(), std::pow(10.0, n - 100)); // singularity must be relative
+    const M m = Scaled(r.Rot() * d * r.Rot(), std::pow(10.0, n - 100));
     M inv;
-    ASSERT_EQ(m.Inverse(inv), S_OK) << "n=" << n;
-    EXPECT_LT(MaxDiff(inv * m, M()), 1e-13) << "n=" << n;
-    EXPECT_LT(MaxDiff(m * inv, M()), 1e-13) << "n=" << n;
+    ASSERT_EQ(m.Inverse(inv), S_OK) << "seed 31337, n=" << n;
+    EXPECT_TRUE(MaxDiff(inv * m, M()) < 1e-13 && MaxDiff(m * inv, M()) < 1e-13) << "seed 31337, n=" << n;
   }
+  M out;
+  EXPECT_TRUE(Scaled(M(), 1e-110).Inverse(out) == S_OK && Scaled(M(), 1e120).Inverse(out) == S_OK);
   EXPECT_EQ(M(2, 1, 0, 0, 3, 4, 0, 0, 5).Determinant(), 30.0);
   EXPECT_EQ(M(0, 0, 5, 0, 3, 4, 2, 1, 0).Determinant(), -30.0) << "a row swap flips the sign";
 }
 
+// Inverse, isometry and the transformation's inverse fail and change nothing.
 TEST(RKMMath3x3Matrix, SingularOrNonFiniteFailsAndKeepsOutput)
 {
   const M sentinel(9, 8, 7, 6, 5, 4, 3, 2, 1);
@@ -72,9 +74,7 @@ TEST(RKMMath3x3Matrix, SingularOrNonFiniteFailsAndKeepsOutput)
         M(1, 0, 0, 0, kNaN, 0, 0, 0, 1), M(1, 0, 0, 0, HUGE_VAL, 0, 0, 0, 1)})
   {
     M out = sentinel;
-    EXPECT_EQ(m.Inverse(out), E_FAIL);
-    EXPECT_EQ(m.MakeIsometry(out), 0);
-    EXPECT_EQ(out, sentinel);
+    EXPECT_TRUE(m.Inverse(out) == E_FAIL && m.MakeIsometry(out) == 0 && out == sentinel);
     RKMMathTransformation t(m, RKMMathVector(1, 2, 3));
     const RKMMathTransformation before = t;
     EXPECT_LT(t.ComputeInverse(), 0);
@@ -85,13 +85,15 @@ TEST(RKMMath3x3Matrix, SingularOrNonFiniteFailsAndKeepsOutput)
   EXPECT_EQ(out, sentinel);
 }
 
+// m = Q·H with Q orthonormal (a reflection stays one) and H symmetric positive definite (Sylvester's
+// criterion); near a rotation, Q is that rotation; the scale is dropped. An unscaled Newton polar
+// iteration needs about 100 steps to bring a 1e-30 singular value to 1.
 TEST(RKMMath3x3Matrix, MakeIsometryIsThePolarFactor)
 {
-  const unsigned seed = 99;
-  SCOPED_TRACE("seed " + std::to_string(seed));
-  Random r{std::mt19937(seed)};
+  Random r{std::mt19937(99)};
   for (int n = 0; n < 200; ++n)
   {
+    SCOPED_TRACE("seed 99, n=" + std::to_string(n));
     const M rot = (n % 2) ? r.Rot() * M(1, 0, 0, 0, 1, 0, 0, 0, -1) : r.Rot();
     const M noisy = M::FromColumns(rot.GetColumn(0) + r.Vector() * 1e-6, rot.GetColumn(1) + r.Vector() * 1e-6,
                                    rot.GetColumn(2) + r.Vector() * 1e-6);
@@ -99,33 +101,22 @@ TEST(RKMMath3x3Matrix, MakeIsometryIsThePolarFactor)
     if (std::fabs(m.Determinant()) < 1e-2)
       continue; // a random matrix may be nearly singular
     M q;
-    ASSERT_EQ(m.MakeIsometry(q), 1) << "n=" << n;
-    EXPECT_LT(MaxDiff(q.Transpose() * q, M()), 1e-12) << "n=" << n;
-    EXPECT_EQ(q.Determinant() > 0, m.Determinant() > 0) << "n=" << n << ": a reflection stays one";
-    EXPECT_LT(MaxDiff(q, m == noisy ? rot : q), 1e-5) << "n=" << n;
-    // m = Q·H with H symmetric positive definite (Sylvester's criterion) is what makes Q the polar factor.
+    ASSERT_EQ(m.MakeIsometry(q), 1);
+    EXPECT_LT(MaxDiff(q.Transpose() * q, M()), 1e-12);
+    EXPECT_EQ(q.Determinant() > 0, m.Determinant() > 0);
+    EXPECT_LT(MaxDiff(q, m == noisy ? rot : q), 1e-5);
     const M h = q.Transpose() * m;
-    EXPECT_LT(MaxDiff(h, h.Transpose()), 1e-12) << "n=" << n;
-    EXPECT_TRUE(h(0, 0) > 0 && h(0, 0) * h(1, 1) - h(0, 1) * h(1, 0) > 0 && h.Determinant() > 0) << "n=" << n;
+    EXPECT_LT(MaxDiff(h, h.Transpose()), 1e-12);
+    EXPECT_TRUE(h(0, 0) > 0 && h(0, 0) * h(1, 1) - h(0, 1) * h(1, 0) > 0 && h.Determinant() > 0);
     ASSERT_EQ(Scaled(rot, 1.0 + n).MakeIsometry(q), 1);
-    EXPECT_LT(MaxDiff(q, rot), 1e-12) << "n=" << n << ": the scale is dropped";
+    EXPECT_LT(MaxDiff(q, rot), 1e-12);
   }
   for (double s : {1e-30, 1e30}) // whatever happens here, an answer given must be orthonormal
   {
     M q = kZero;
     EXPECT_TRUE(M(s, 0, 0, 0, 1, 0, 0, 0, 1).MakeIsometry(q) ? MaxDiff(q, M()) < 1e-12 : q == kZero) << s;
   }
-}
-
-TEST(RKMMath3x3Matrix, ExtremeButRegularScales)
-{
-  // Determinants of 1e-330 or 1e360 leave the double range unless the matrix is scaled first, and an
-  // unscaled Newton polar iteration needs about log2(1e30) = 100 steps to bring a 1e-30 singular value to 1.
   M out;
-  double k = 0;
-  EXPECT_EQ(Scaled(M(), 1e-110).Inverse(out), S_OK);
-  EXPECT_EQ(Scaled(M(), 1e120).Inverse(out), S_OK);
-  EXPECT_TRUE(Scaled(M(), 1e120).IsSimilitude(k));
   EXPECT_EQ(M(1e-30, 0, 0, 0, 1, 0, 0, 0, 1).MakeIsometry(out), 1);
   EXPECT_EQ(out, M());
 }
@@ -133,25 +124,25 @@ TEST(RKMMath3x3Matrix, ExtremeButRegularScales)
 TEST(RKMMath3x3Matrix, SimilitudeAndScalingRecognition)
 {
   Random r{std::mt19937(5)};
+  double k = 0;
   for (double s : {2.5, 1e-3, 1e4})
   {
     const M rot = r.Rot(), mirror = rot * M(-1, 0, 0, 0, 1, 0, 0, 0, 1);
-    double k = 0;
     EXPECT_TRUE(RKMMathTransformation(Scaled(rot, s), RKMMathVector(1, 2, 3)).IsSimilitude(k));
     EXPECT_NEAR(k, s, 1e-12 * s);
     EXPECT_TRUE(Scaled(mirror, s).IsSimilitude(k));
     EXPECT_NEAR(k, -s, 1e-12 * s) << "a reflection has a negative scale";
-    EXPECT_FALSE(Scaled(rot * M(1, 1e-4, 0, 0, 1, 0, 0, 0, 1), s).IsSimilitude(k)) << "shear";
-    EXPECT_FALSE(Scaled(rot * M(1, 0, 0, 0, 2, 0, 0, 0, 0.5), s).IsSimilitude(k)) << "det 1, not uniform";
-    // Unit columns 1e-6 rad from orthogonal: lengths and determinant alone cannot tell.
-    EXPECT_FALSE(Scaled(rot * M(1, std::sin(1e-6), 0, 0, std::cos(1e-6), 0, 0, 0, 1), s).IsSimilitude(k));
+    // A shear, det 1 but not uniform, and unit columns 1e-6 rad from orthogonal (lengths and the
+    // determinant alone cannot tell).
+    for (const M &no : {M(1, 1e-4, 0, 0, 1, 0, 0, 0, 1), M(1, 0, 0, 0, 2, 0, 0, 0, 0.5),
+                        M(1, std::sin(1e-6), 0, 0, std::cos(1e-6), 0, 0, 0, 1)})
+      EXPECT_FALSE(Scaled(rot * no, s).IsSimilitude(k)) << s;
   }
-  double k = 77;
-  EXPECT_FALSE(kZero.IsSimilitude(k));
-  EXPECT_FALSE(M(1, 0, 0, 0, kNaN, 0, 0, 0, 1).IsSimilitude(k));
+  EXPECT_TRUE(Scaled(M(), 1e120).IsSimilitude(k));
+  k = 77;
+  EXPECT_FALSE(kZero.IsSimilitude(k) || M(1, 0, 0, 0, kNaN, 0, 0, 0, 1).IsSimilitude(k));
   EXPECT_EQ(k, 77) << "a rejection leaves the scale alone";
-  EXPECT_TRUE(Scaled(M(), -2).IsScaling(&k));
-  EXPECT_EQ(k, -2);
+  EXPECT_TRUE(Scaled(M(), -2).IsScaling(&k) && k == -2);
   EXPECT_TRUE(Scaled(M(), 1e-200).IsScaling());
   for (const M &m : {M(3, 0, 0, 0, 3, 0, 0, 0, 3.000001), M(3, 0, 0, 0, 3, 1e-6, 0, 0, 3), kZero, r.Rot(),
                      M(1, 0, kNaN, 0, 1, 0, 0, 0, 1)})
@@ -171,8 +162,7 @@ TEST(RKMMathTransformation, ApplyComposeAndInvert)
   RKMMathTransformation ai = a;
   ASSERT_EQ(ai.ComputeInverse(), S_OK);
   EXPECT_NEAR((ai * (a * p)).DistanceTo(p), 0, 1e-12);
-  EXPECT_LT(MaxDiff((a * ai).GetMatrix(), M()), 1e-14);
-  EXPECT_NEAR((a * ai).GetTranslation().Norm(), 0, 1e-14);
+  EXPECT_TRUE(MaxDiff((a * ai).GetMatrix(), M()) < 1e-14 && (a * ai).GetTranslation().Norm() < 1e-14);
   EXPECT_TRUE(RKMMathTransformation().IsIdentity());
   EXPECT_FALSE(RKMMathTransformation(RKMMathVector(0, 0, 1e-300)).IsIdentity());
 }
@@ -181,9 +171,7 @@ TEST(RKMTolerance, DefaultsAndUsability)
 {
   const RKMTolerance &d = RKMGetDefaultTolerance();
   EXPECT_EQ(&d, &RKMGetDefaultTolerance());
-  EXPECT_EQ(d.GetResolution(), 1e-3);
-  EXPECT_EQ(d.GetSmallLength(), 1e-6);
-  EXPECT_EQ(d.GetNumericalEpsilon(), 1e-12);
+  EXPECT_TRUE(d.GetResolution() == 1e-3 && d.GetSmallLength() == 1e-6 && d.GetNumericalEpsilon() == 1e-12);
   EXPECT_DOUBLE_EQ(d.GetSquareResolution(), 1e-6);
   EXPECT_DOUBLE_EQ(d.GetSquareSmallLength(), 1e-12);
   EXPECT_EQ(RKMToleranceError(d), S_OK);

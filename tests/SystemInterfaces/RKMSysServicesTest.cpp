@@ -57,17 +57,18 @@ void Lock(RKMMutex &m) { (m.*RKMMutex::LockF)(); }
 void Unlock(RKMMutex &m) { (m.*RKMMutex::UnlockF)(); }
 } // namespace
 
+// Aborting, not exiting, is what leaves a core and stops atexit handlers from running on a broken state.
 TEST(RKMSysServicesDeathTest, FatalErrorsAbortWithAMessage)
 {
   GTEST_FLAG_SET(death_test_style, "threadsafe");
   EXPECT_DEATH(RKMFatalError("Geo", "a.cpp", "Run", "broken", "x=3", 17), "fatal error 17 in Geo.*broken x=3");
   EXPECT_DEATH(RKMQNVnull(), "required pointer is null");
-  // Aborting, not exiting, is what leaves a core and stops atexit handlers from running on a broken state.
   EXPECT_EXIT(RKMFatalError(nullptr, nullptr, nullptr, nullptr, nullptr, -1), testing::KilledBySignal(SIGABRT),
               "fatal error -1");
   EXPECT_EXIT(RKMQNVnull(), testing::KilledBySignal(SIGABRT), "");
 }
 
+// Anything but exactly one int gives the default rather than a truncated or wrapped value.
 TEST(RKMSysServices, EnvironmentSettings)
 {
   const char *name = "RKM_SYS_TEST_SETTING";
@@ -79,7 +80,6 @@ TEST(RKMSysServices, EnvironmentSettings)
     ASSERT_EQ(setenv(name, std::to_string(v).c_str(), 1), 0);
     EXPECT_EQ(RKMMathDebug::_integerGetEnv(name, 3), v);
   }
-  // Anything but exactly one int gives the default rather than a truncated or wrapped value.
   for (const char *bad : {"2147483648", "-2147483649", "99999999999999999999", "12abc", "3 ", "", "1.5", "0x10"})
   {
     ASSERT_EQ(setenv(name, bad, 1), 0);
@@ -87,9 +87,8 @@ TEST(RKMSysServices, EnvironmentSettings)
   }
   unsetenv(name);
   EXPECT_EQ(RKMGetEnv(name), nullptr);
-  EXPECT_EQ(RKMMathDebug::_integerGetEnv(name, 5), 5);
-  EXPECT_EQ(RKMMathDebug::_integerGetEnv(name), 0);
-  EXPECT_EQ(RKMMathDebug::_integerGetEnv(nullptr, 8), 8);
+  EXPECT_TRUE(RKMMathDebug::_integerGetEnv(name, 5) == 5 && RKMMathDebug::_integerGetEnv(name) == 0 &&
+              RKMMathDebug::_integerGetEnv(nullptr, 8) == 8);
 }
 
 TEST(RKMSysServices, RawBlocksAndDynamicFunctions)
@@ -109,25 +108,26 @@ TEST(RKMSysServices, RawBlocksAndDynamicFunctions)
   ASSERT_NE(dladdr(reinterpret_cast<void *>(&RKMGetEnv), &info), 0);
   auto *getEnv =
       reinterpret_cast<const char *(*)(const char *)>(RKMQNVDynamicFunction(info.dli_fname, "_Z9RKMGetEnvPKc"));
-  ASSERT_NE(getEnv, nullptr);
+  auto *len = reinterpret_cast<size_t (*)(const char *)>(RKMQNVDynamicFunction("libc.so.6", "strlen"));
+  ASSERT_TRUE(getEnv && len);
   setenv("RKM_SYS_TEST_DYN", "found", 1);
   EXPECT_STREQ(getEnv("RKM_SYS_TEST_DYN"), "found");
-  auto *len = reinterpret_cast<size_t (*)(const char *)>(RKMQNVDynamicFunction("libc.so.6", "strlen"));
-  ASSERT_NE(len, nullptr);
   EXPECT_EQ(len("abcd"), 4u);
-  // "BrokenLocale" must be tried as libBrokenLocale.so, which every C development install has.
+  // "BrokenLocale" must be tried as libBrokenLocale.so, which every C development install has; dlopen of
+  // "" would search the whole process.
   EXPECT_NE(RKMQNVDynamicFunction("BrokenLocale", "__ctype_get_mb_cur_max"), nullptr);
-  EXPECT_EQ(RKMQNVDynamicFunction("libc.so.6", "rkm_no_such_symbol"), nullptr);
-  EXPECT_EQ(RKMQNVDynamicFunction("rkm_no_such_library", "strlen"), nullptr);
-  EXPECT_EQ(RKMQNVDynamicFunction(nullptr, "strlen"), nullptr);
-  EXPECT_EQ(RKMQNVDynamicFunction("", "strlen"), nullptr) << "dlopen of \"\" would search the whole process";
-  EXPECT_EQ(RKMQNVDynamicFunction("libc.so.6", ""), nullptr);
+  for (const auto &[library, symbol] : {std::pair<const char *, const char *>{"libc.so.6", "rkm_no_such_symbol"},
+                                        {"rkm_no_such_library", "strlen"},
+                                        {nullptr, "strlen"},
+                                        {"", "strlen"},
+                                        {"libc.so.6", ""}})
+    EXPECT_EQ(RKMQNVDynamicFunction(library, symbol), nullptr) << (library ? library : "null") << " " << symbol;
 }
 
+// Store-buffering litmus: with a full fence between each side's store and load, at least one side sees
+// the other's store. With a mere compiler barrier x86 usually shows both missing in some rounds.
 TEST(RKMSysServices, MemoryBarrierForbidsStoreLoadReordering)
 {
-  // Store-buffering litmus: with a full fence between each side's store and load, at least one side
-  // sees the other's store. With a mere compiler barrier x86 usually shows both missing in some rounds.
   std::atomic<int> x{0}, y{0}, arrived{0};
   int seen[2] = {1, 1}, bothMissed = 0;
   auto barrier = [&](int target)
@@ -163,11 +163,13 @@ TEST(RKMSysServices, MemoryBarrierForbidsStoreLoadReordering)
   EXPECT_EQ(bothMissed, 0);
 }
 
+// Recursive for its owner, exclusive against the others; nested locking keeps a split
+// read-modify-write, which widens any race, exact.
 TEST(RKMMutex, RecursiveAndExclusiveAcrossThreads)
 {
   RKMMutex m(1, 2, 3);
   EXPECT_EQ(m.Lock(), S_OK);
-  Lock(m); // the owner may lock again, through the library's entry
+  Lock(m);
   std::atomic<bool> entered{false};
   std::thread other(
       [&]
@@ -182,8 +184,7 @@ TEST(RKMMutex, RecursiveAndExclusiveAcrossThreads)
   EXPECT_EQ(m.Unlock(), S_OK);
   other.join();
   EXPECT_TRUE(entered);
-
-  long counter = 0; // nested locking; the split read-modify-write widens any race
+  long counter = 0;
   std::vector<std::thread> threads;
   for (int t = 0; t < 4; ++t)
     threads.emplace_back(
@@ -205,11 +206,13 @@ TEST(RKMMutex, RecursiveAndExclusiveAcrossThreads)
   EXPECT_EQ(counter, 80000);
 }
 
+// Blocks of every size class, from pools and not, returned to any pool; sizes near SIZE_MAX would wrap
+// when rounded up to a size class, and give null instead.
 TEST(RKMSysAllocator, PoolsBlocksAndHugeSizes)
 {
   // Pools live for the whole process; static keeps them reachable for the leak checker.
   static RKMSysPool *pool = RKMSysCreatePool(0, 0, "geometry"), *fixed = RKMSysCreatePool(0, 200, "fixed"),
-                    *unnamed = RKMSysCreatePool(0, 0, nullptr);
+                    *unnamed = RKMSysCreatePool(0, 0, nullptr), *huge = RKMSysCreatePool(0, SIZE_MAX, "huge");
   ASSERT_TRUE(pool && fixed && unnamed);
   EXPECT_STREQ(RKMSysGetPoolName(pool), "geometry");
   EXPECT_STREQ(RKMSysGetPoolName(unnamed), "");
@@ -230,15 +233,8 @@ TEST(RKMSysAllocator, PoolsBlocksAndHugeSizes)
   for (size_t i = 0; i < live.size(); ++i)
     RKMSpecializedDelete(live[i].p, i % 2 ? nullptr : fixed); // the pool named on return does not matter
   RKMSpecializedDelete(nullptr, pool);
-  for (size_t huge : {SIZE_MAX - 15, SIZE_MAX - 16, SIZE_MAX / 2, size_t(1) << 62})
-    EXPECT_EQ(RKMSpecializedNew(huge, pool), nullptr) << huge;
-}
-
-TEST(RKMSysAllocator, LargestSizesGiveNull)
-{
-  // Rounding the last sizes below SIZE_MAX up to a size class would wrap to a block with no room.
-  EXPECT_EQ(RKMSpecializedNew(SIZE_MAX, nullptr), nullptr);
-  static RKMSysPool *huge = RKMSysCreatePool(0, SIZE_MAX, "huge");
+  for (size_t size : {SIZE_MAX - 15, SIZE_MAX - 16, SIZE_MAX / 2, size_t(1) << 62, SIZE_MAX})
+    EXPECT_EQ(RKMSpecializedNew(size, size == SIZE_MAX ? nullptr : pool), nullptr) << size;
   EXPECT_EQ(RKMSpecializedNew(1, huge), nullptr);
 }
 

@@ -1,8 +1,8 @@
 #pragma once
 
-// Exact rational reference for the plane intersectors. Every double converts to an mpq_class
-// without rounding, so the answers below are the true ones for the doubles the intersectors see,
-// whatever the arithmetic mode.
+// Exact rational reference for the plane intersectors, and the point generators of the intersector
+// sweeps. Every double converts to an mpq_class without rounding, so the answers below are the true
+// ones for the doubles the intersectors see, whatever the arithmetic mode.
 
 #include <gmpxx.h>
 
@@ -22,21 +22,21 @@
 #include "RKMPolyExactArithmetic.h"
 #include "RKMPolyIntersectionPoint.h"
 
-namespace oracle
-{
-
 // Sanitized builds run the same randomized checks on fewer cases.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int kScale = 20;
+#define RKM_EXACT_ORACLE_SANITIZED 1
 #elif defined(__has_feature)
 #if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
-constexpr int kScale = 20;
-#else
-constexpr int kScale = 1;
+#define RKM_EXACT_ORACLE_SANITIZED 1
 #endif
-#else
-constexpr int kScale = 1;
 #endif
+#ifndef RKM_EXACT_ORACLE_SANITIZED
+#define RKM_EXACT_ORACLE_SANITIZED 0
+#endif
+
+namespace oracle
+{
+constexpr int kScale = RKM_EXACT_ORACLE_SANITIZED ? 20 : 1;
 
 using Mode = RKMPolyExactArithmetic::Mode;
 
@@ -60,11 +60,6 @@ inline bool operator==(const QPoint &a, const QPoint &b)
   return a.x == b.x && a.y == b.y;
 }
 
-inline bool LexLess(const QPoint &a, const QPoint &b)
-{
-  return a.x < b.x || (a.x == b.x && a.y < b.y);
-}
-
 inline mpq_class Cross(const QPoint &a, const QPoint &b, const QPoint &c)
 {
   return (b.x - a.x) * (c.y - a.y) - (b.y - a.y) * (c.x - a.x);
@@ -78,10 +73,8 @@ inline int Orient(const QPoint &a, const QPoint &b, const QPoint &c)
 // On the closed segment ab (a may equal b).
 inline bool OnClosedSegment(const QPoint &a, const QPoint &b, const QPoint &x)
 {
-  if (Orient(a, b, x) != 0)
-    return false;
-  return std::min(a.x, b.x) <= x.x && x.x <= std::max(a.x, b.x) && std::min(a.y, b.y) <= x.y &&
-         x.y <= std::max(a.y, b.y);
+  return Orient(a, b, x) == 0 && std::min(a.x, b.x) <= x.x && x.x <= std::max(a.x, b.x) &&
+         std::min(a.y, b.y) <= x.y && x.y <= std::max(a.y, b.y);
 }
 
 inline QPoint Lerp(const QPoint &a, const QPoint &b, const mpq_class &t)
@@ -91,9 +84,7 @@ inline QPoint Lerp(const QPoint &a, const QPoint &b, const mpq_class &t)
 
 inline std::string Str(const QPoint &p)
 {
-  std::ostringstream s;
-  s << "(" << p.x.get_str() << "," << p.y.get_str() << ")";
-  return s.str();
+  return "(" + p.x.get_str() + "," + p.y.get_str() + ")";
 }
 
 inline std::string Str(const RKMMathPoint2D &p)
@@ -101,6 +92,14 @@ inline std::string Str(const RKMMathPoint2D &p)
   std::ostringstream s;
   s.precision(17);
   s << "(" << p.x << "," << p.y << ")";
+  return s.str();
+}
+
+inline std::string Str(const RKMMathPoint &p)
+{
+  std::ostringstream s;
+  s.precision(17);
+  s << "(" << p.x << "," << p.y << "," << p.z << ")";
   return s.str();
 }
 
@@ -112,6 +111,7 @@ struct Feature
   int index = 0;
   bool operator==(const Feature &o) const { return type == o.type && index == o.index; }
   bool operator!=(const Feature &o) const { return !(*this == o); }
+  bool operator<(const Feature &o) const { return type < o.type || (type == o.type && index < o.index); }
 };
 
 inline Feature Slot(const RKMPolyIntersectionPoint &pt, int slot)
@@ -121,19 +121,12 @@ inline Feature Slot(const RKMPolyIntersectionPoint &pt, int slot)
 
 inline std::string Str(const Feature &f)
 {
-  static const char *names[] = {"?", "V", "B", "T"};
-  std::ostringstream s;
-  s << (f.type >= 0 && f.type <= 3 ? names[f.type] : "!") << f.index;
-  return s.str();
+  static const char *const names[] = {"?", "V", "B", "T"};
+  return (f.type >= 0 && f.type <= 3 ? names[f.type] : "!") + std::to_string(f.index);
 }
 
-inline std::string Str(const RKMPolyIntersectionPoint &pt)
-{
-  return Str(Slot(pt, 0)) + "x" + Str(Slot(pt, 1));
-}
-
-// The lowest-dimensional feature of triangle t (caller numbering) holding x; type 0 when x is
-// outside the closed triangle.
+// The lowest-dimensional feature of triangle t holding x; type 0 when x is outside the closed
+// triangle.
 inline Feature TriangleFeature(const QPoint t[3], const QPoint &x)
 {
   for (int v = 0; v < 3; ++v)
@@ -171,22 +164,11 @@ inline int PermSign(int p)
 inline Feature Renumber(const Feature &f, int p)
 {
   const int *m = kPerm[p];
-  if (f.type == 1)
-  {
-    for (int k = 0; k < 3; ++k)
-      if (m[k] == f.index)
-        return {1, k};
-  }
-  else if (f.type == 2)
-  {
-    const int i = f.index, j = (f.index + 1) % 3;
-    for (int k = 0; k < 3; ++k)
-    {
-      const int u = m[k], w = m[(k + 1) % 3];
-      if ((u == i && w == j) || (u == j && w == i))
-        return {2, k};
-    }
-  }
+  for (int k = 0; k < 3; ++k)
+    if ((f.type == 1 && m[k] == f.index) ||
+        (f.type == 2 && ((m[k] == f.index && m[(k + 1) % 3] == (f.index + 1) % 3) ||
+                         (m[(k + 1) % 3] == f.index && m[k] == (f.index + 1) % 3))))
+      return {f.type, k};
   return f;
 }
 
@@ -194,7 +176,8 @@ inline Feature Renumber(const Feature &f, int p)
 // a point set, two for a segment.
 inline std::vector<QPoint> ConvexHull(std::vector<QPoint> pts)
 {
-  std::sort(pts.begin(), pts.end(), LexLess);
+  std::sort(pts.begin(), pts.end(),
+            [](const QPoint &a, const QPoint &b) { return a.x < b.x || (a.x == b.x && a.y < b.y); });
   pts.erase(std::unique(pts.begin(), pts.end()), pts.end());
   if (pts.size() <= 2)
     return pts;
@@ -218,25 +201,27 @@ inline std::vector<QPoint> ConvexHull(std::vector<QPoint> pts)
 inline std::vector<QPoint> ClipLeft(const std::vector<QPoint> &poly, const QPoint &a, const QPoint &b)
 {
   std::vector<QPoint> out;
-  const size_t n = poly.size();
-  for (size_t i = 0; i < n; ++i)
+  for (size_t i = 0; i < poly.size(); ++i)
   {
-    const QPoint &cur = poly[i], &nxt = poly[(i + 1) % n];
+    const QPoint &cur = poly[i], &nxt = poly[(i + 1) % poly.size()];
     const mpq_class sc = Cross(a, b, cur), sn = Cross(a, b, nxt);
     if (sgn(sc) >= 0)
       out.push_back(cur);
-    if ((sgn(sc) > 0 && sgn(sn) < 0) || (sgn(sc) < 0 && sgn(sn) > 0))
+    if (sgn(sc) * sgn(sn) < 0)
       out.push_back(Lerp(cur, nxt, sc / (sc - sn)));
   }
   return out;
 }
 
 // The intersection of two closed triangles: result 3/2/1/0 as the triangle intersector counts it, or
-// -6 for a degenerate triangle, with the corners counter-clockwise (the two ends for a segment).
+// -6 for a degenerate triangle, with the corners counter-clockwise (the two ends for a segment), the
+// features of each corner on the two triangles and the triangles' orientations.
 struct PolygonAnswer
 {
   int result = 0;
   std::vector<QPoint> corners;
+  int orient[2] = {0, 0};
+  std::vector<std::array<Feature, 2>> features;
 };
 
 inline PolygonAnswer IntersectTriangles(const QPoint t1[3], const QPoint t2[3])
@@ -252,12 +237,13 @@ inline PolygonAnswer IntersectTriangles(const QPoint t1[3], const QPoint t2[3])
   if (o1 < 0)
     std::swap(poly[1], poly[2]);
   for (int e = 0; e < 3 && !poly.empty(); ++e)
-  {
-    const QPoint &a = t2[e], &b = t2[(e + 1) % 3];
-    poly = o2 > 0 ? ClipLeft(poly, a, b) : ClipLeft(poly, b, a);
-  }
+    poly = o2 > 0 ? ClipLeft(poly, t2[e], t2[(e + 1) % 3]) : ClipLeft(poly, t2[(e + 1) % 3], t2[e]);
   ans.corners = ConvexHull(poly);
-  ans.result = ans.corners.size() >= 3 ? 3 : static_cast<int>(ans.corners.size());
+  ans.result = std::min<int>(3, static_cast<int>(ans.corners.size()));
+  ans.orient[0] = o1;
+  ans.orient[1] = o2;
+  for (const QPoint &c : ans.corners)
+    ans.features.push_back({TriangleFeature(t1, c), TriangleFeature(t2, c)});
   return ans;
 }
 
@@ -272,34 +258,23 @@ struct ClipAnswer
 inline ClipAnswer ClipSegment(const QPoint tri[3], const QPoint &p, const QPoint &q)
 {
   ClipAnswer ans;
-  if (p == q)
-  {
-    ans.result = -5;
-    return ans;
-  }
   const int o = Orient(tri[0], tri[1], tri[2]);
-  if (o == 0)
+  if (p == q || o == 0)
   {
-    ans.result = -6;
+    ans.result = p == q ? -5 : -6;
     return ans;
   }
   mpq_class lo = 0, hi = 1;
   for (int e = 0; e < 3; ++e)
   {
     // f(t) = o · Cross(edge, p + t(q − p)) ≥ 0 on the triangle's side, affine in t.
-    const QPoint &a = tri[e], &b = tri[(e + 1) % 3];
-    const mpq_class f0 = o * Cross(a, b, p), f1 = o * Cross(a, b, q);
-    if (f0 == f1)
-    {
-      if (sgn(f0) < 0)
-        return ans;
-      continue;
-    }
-    const mpq_class tz = f0 / (f0 - f1);
+    const mpq_class f0 = o * Cross(tri[e], tri[(e + 1) % 3], p), f1 = o * Cross(tri[e], tri[(e + 1) % 3], q);
+    if (f0 == f1 && sgn(f0) < 0)
+      return ans;
     if (f1 > f0)
-      lo = std::max(lo, tz);
-    else
-      hi = std::min(hi, tz);
+      lo = std::max(lo, mpq_class(f0 / (f0 - f1)));
+    else if (f1 < f0)
+      hi = std::min(hi, mpq_class(f0 / (f0 - f1)));
   }
   if (lo > hi)
     return ans;
@@ -331,42 +306,21 @@ inline CrossAnswer IntersectSegments(const QPoint &a, const QPoint &b, const QPo
   const int o1 = Orient(c, d, a), o2 = Orient(c, d, b), o3 = Orient(a, b, c), o4 = Orient(a, b, d);
   if (o3 == 0 && o4 == 0)
   {
-    ans.colinear = true;
     // Positions along ab; the overlap of the two intervals decides.
+    ans.colinear = true;
     auto s = [&](const QPoint &x) { return mpq_class((x.x - a.x) * (b.x - a.x) + (x.y - a.y) * (b.y - a.y)); };
-    const mpq_class a0 = 0, a1 = s(b);
-    mpq_class c0 = s(c), c1 = s(d);
-    if (c0 > c1)
-      std::swap(c0, c1);
-    const mpq_class lo = std::max(a0, c0), hi = std::min(a1, c1);
-    if (lo < hi)
-      ans.result = 2;
-    else if (lo == hi)
-    {
-      ans.result = 1;
-      ans.x = (lo == a0) ? a : b;
-    }
-    else
-      ans.result = 0;
+    const mpq_class a1 = s(b), c0 = std::min(s(c), s(d)), c1 = std::max(s(c), s(d));
+    const mpq_class lo = std::max(mpq_class(0), c0), hi = std::min(a1, c1);
+    ans.result = lo < hi ? 2 : lo == hi ? 1 : 0;
+    ans.x = sgn(lo) == 0 ? a : b;
   }
   else if (o1 * o2 > 0 || o3 * o4 > 0)
     ans.result = 0;
   else
   {
     ans.result = 1;
-    if (o1 == 0)
-      ans.x = a;
-    else if (o2 == 0)
-      ans.x = b;
-    else if (o3 == 0)
-      ans.x = c;
-    else if (o4 == 0)
-      ans.x = d;
-    else
-    {
-      const mpq_class ca = Cross(c, d, a), cb = Cross(c, d, b);
-      ans.x = Lerp(a, b, ca / (ca - cb));
-    }
+    const mpq_class ca = Cross(c, d, a), cb = Cross(c, d, b);
+    ans.x = o1 == 0 ? a : o2 == 0 ? b : o3 == 0 ? c : o4 == 0 ? d : Lerp(a, b, ca / (ca - cb));
   }
   if (ans.result == 1)
   {
@@ -374,6 +328,27 @@ inline CrossAnswer IntersectSegments(const QPoint &a, const QPoint &b, const QPo
     ans.f[1] = SegmentFeature(c, d, ans.x);
   }
   return ans;
+}
+
+// Which of a, b, c, d (1 to 4) lies closest to the other segment's line, ties to the earlier, from
+// exact squared distances.
+inline int ClosestExtremity(const QPoint &a, const QPoint &b, const QPoint &c, const QPoint &d)
+{
+  const QPoint q[4] = {a, b, c, d};
+  int best = 0;
+  mpq_class bestD;
+  for (int k = 0; k < 4; ++k)
+  {
+    const QPoint &l0 = q[k < 2 ? 2 : 0], &l1 = q[k < 2 ? 3 : 1];
+    const mpq_class cross = Cross(l0, l1, q[k]);
+    const mpq_class dist = cross * cross / ((l1.x - l0.x) * (l1.x - l0.x) + (l1.y - l0.y) * (l1.y - l0.y));
+    if (k == 0 || dist < bestD)
+    {
+      best = k;
+      bestD = dist;
+    }
+  }
+  return best + 1;
 }
 
 // Point generators. All points of one case come from one small integer grid pushed through one
@@ -392,17 +367,10 @@ enum class Layout
   Extreme
 };
 
-inline const char *LayoutName(Layout l)
-{
-  static const char *names[] = {"SmallGrid", "Lattice", "Skewed", "Extreme"};
-  return names[static_cast<int>(l)];
-}
-
 // Points of dimension D from the small grid 0 … k through the case's affine map. The lattice and
 // extreme maps differ by dimension: entries up to 40 in the plane and 20 in space, and powers of
 // two chosen so that products of coordinates underflow or overflow.
-template <int D>
-class GridPointSource
+template <int D> class GridPointSource
 {
 public:
   using Point = std::conditional_t<D == 2, RKMMathPoint2D, RKMMathPoint>;
@@ -492,7 +460,7 @@ private:
 using PointSource = GridPointSource<2>;
 
 // One randomized sweep: the mode, where the points come from, the grid size, how many cases and
-// the seed that reproduces them.
+// the seed that reproduces them; printed readably and deterministically in names and messages.
 struct SweepCase
 {
   Mode mode;
@@ -502,16 +470,15 @@ struct SweepCase
   std::uint64_t seed;
 };
 
-// Readable and deterministic in test names and failure messages.
-inline void PrintTo(const SweepCase &c, std::ostream *os)
-{
-  *os << ModeName(c.mode) << " " << LayoutName(c.layout) << " 0.." << c.k << " x" << c.count;
-  *os << " seed " << c.seed;
-}
-
 inline std::string SweepName(const SweepCase &c)
 {
-  return std::string(ModeName(c.mode)) + "_" + LayoutName(c.layout) + std::to_string(c.k);
+  static const char *const layouts[] = {"SmallGrid", "Lattice", "Skewed", "Extreme"};
+  return std::string(ModeName(c.mode)) + "_" + layouts[static_cast<int>(c.layout)] + std::to_string(c.k);
+}
+
+inline void PrintTo(const SweepCase &c, std::ostream *os)
+{
+  *os << SweepName(c) << " x" << c.count << " seed " << c.seed;
 }
 
 } // namespace oracle
